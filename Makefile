@@ -1,0 +1,40 @@
+# Quick start: `make demo` and `make test` set up what is missing first.
+BUILD      ?= build
+JOBS       ?= $(shell nproc 2>/dev/null || echo 2)
+NATIVE_DIR := $(BUILD)/native
+WIN64_DIR  := $(BUILD)/win-x64
+WIN32_DIR  := $(BUILD)/win-x86
+
+.PHONY: all setup native windows test demo bench clean
+
+all: native
+
+setup:
+	@scripts/setup.sh native windows wine
+
+native:
+	@scripts/setup.sh native
+	cmake -S . -B $(NATIVE_DIR) -DCMAKE_BUILD_TYPE=Debug -DKPX_SANITIZE=ON
+	cmake --build $(NATIVE_DIR) -j $(JOBS)
+
+windows:
+	@scripts/setup.sh windows
+	cmake -S . -B $(WIN64_DIR) -DCMAKE_TOOLCHAIN_FILE=cmake/mingw-x86_64.cmake -DCMAKE_BUILD_TYPE=Release
+	cmake --build $(WIN64_DIR) -j $(JOBS)
+	cmake -S . -B $(WIN32_DIR) -DCMAKE_TOOLCHAIN_FILE=cmake/mingw-i686.cmake -DCMAKE_BUILD_TYPE=Release
+	cmake --build $(WIN32_DIR) -j $(JOBS)
+
+test: setup native windows
+	cd $(NATIVE_DIR) && ctest --output-on-failure -j $(JOBS)
+
+demo: native
+	$(NATIVE_DIR)/sim/kpx-sim examples/demo/model.json examples/demo/scenario.json --sandbox $(BUILD)/demo-sandbox
+
+bench:
+	@scripts/setup.sh native
+	cmake -S . -B $(BUILD)/bench -DCMAKE_BUILD_TYPE=Release
+	cmake --build $(BUILD)/bench -j $(JOBS) --target kpx-bench
+	$(BUILD)/bench/bench/kpx-bench
+
+clean:
+	rm -rf $(BUILD)

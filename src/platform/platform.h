@@ -1,0 +1,126 @@
+// One interface per outside thing the add-in touches. The Win32 build
+// implements them over the real system; the native build over a sandbox.
+// Paths are Windows paths ("C:\dir\file.txt") in both builds. Text is UTF-8
+// unless a member says otherwise.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "automation/object.h"
+
+namespace kpx::platform {
+
+// ---------------------------------------------------------------- registry
+
+enum class RootKey : uint32_t {
+  CurrentUser = 0x80000001u,
+  LocalMachine = 0x80000002u,
+};
+
+inline constexpr uint32_t kRegSz = 1;
+inline constexpr uint32_t kRegBinary = 3;
+inline constexpr uint32_t kRegDword = 4;
+
+// A value as the registry holds it: its type code and its bytes. A REG_SZ's
+// bytes are text in the system code page with its terminating NUL counted;
+// a REG_DWORD's are four little-endian bytes.
+struct RegistryValue {
+  uint32_t type = 0;
+  std::string data;
+};
+
+enum class KeyDisposition { Failed, Created, Opened };
+
+class Registry {
+ public:
+  virtual ~Registry() = default;
+  // Opens the key for reading (READ_CONTROL | KEY_QUERY_VALUE |
+  // KEY_ENUMERATE_SUB_KEYS) and reads one value ("" is the key's default
+  // value). Nothing when the key or the value is missing.
+  virtual std::optional<RegistryValue> QueryValue(RootKey root, std::string_view key,
+                                                  std::string_view name) = 0;
+  // Opens an existing key for writing (KEY_WRITE) and writes one value. A
+  // missing key is not created; false when nothing was written.
+  virtual bool SetValue(RootKey root, std::string_view key, std::string_view name,
+                        const RegistryValue& value) = 0;
+  // Creates the key, or opens it when it exists (non-volatile, all access).
+  virtual KeyDisposition CreateKey(RootKey root, std::string_view key) = 0;
+
+  // Text crosses the registry in the system's ANSI code page.
+  virtual std::string ToAnsi(std::string_view utf8) = 0;
+  virtual std::string FromAnsi(std::string_view ansi) = 0;
+};
+
+// ------------------------------------------------------------------- files
+
+class FileSystem {
+ public:
+  virtual ~FileSystem() = default;
+  // Whether a file or a folder of that name exists.
+  virtual bool Exists(std::string_view path) = 0;
+  // Deletes a file; false when it was missing or could not be deleted.
+  virtual bool DeleteFile(std::string_view path) = 0;
+  // Opens the file for appending (creating it when missing), writes the
+  // text in the system code page, closes it. False on any failure.
+  virtual bool AppendText(std::string_view path, std::string_view text) = 0;
+};
+
+// ------------------------------------------------------------------- clock
+
+struct DateTime {
+  int year = 1899, month = 12, day = 30;
+  int hour = 0, minute = 0, second = 0;
+};
+
+class Clock {
+ public:
+  virtual ~Clock() = default;
+  // Seconds since midnight, as VB's Timer gives them.
+  virtual float Timer() = 0;
+  virtual DateTime Now() = 0;
+  virtual void Sleep(uint32_t milliseconds) = 0;
+};
+
+// ---------------------------------------------------------------- objects
+
+class ObjectFactory {
+ public:
+  virtual ~ObjectFactory() = default;
+  // CreateObject(progId). Raises 429 (or the system's error) on failure.
+  virtual ObjectPtr CreateObject(std::string_view progId) = 0;
+  // `New` of a class known by its class id, used through interface `iid`.
+  // Ids are in registry form, "{XXXXXXXX-...}". Raises 429 on failure.
+  virtual ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) = 0;
+};
+
+// ----------------------------------------------------------- user interface
+
+inline constexpr uint32_t kMbOk = 0;
+inline constexpr int kIdOk = 1;
+inline constexpr uint32_t kHelpContext = 1;
+inline constexpr uint32_t kHelpFinder = 11;
+
+class UserInterface {
+ public:
+  virtual ~UserInterface() = default;
+  // A modal message box; returns the button pressed (kIdOk ...). An empty
+  // title means the default one.
+  virtual int MessageBox(std::string_view text, std::string_view title, uint32_t style) = 0;
+  virtual bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) = 0;
+  // Lets the host process its pending window messages once.
+  virtual void DoEvents() = 0;
+};
+
+// Everything outside, handed to the add-in's module as one.
+struct Platform {
+  Registry& registry;
+  FileSystem& files;
+  Clock& clock;
+  ObjectFactory& objects;
+  UserInterface& ui;
+};
+
+}  // namespace kpx::platform

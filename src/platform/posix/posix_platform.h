@@ -1,0 +1,63 @@
+// The outside world for the native build: a registry kept in a REGEDIT4
+// text file, and Windows paths mapped into a sandbox folder.
+#pragma once
+
+#include <filesystem>
+#include <map>
+#include <string>
+
+#include "platform/platform.h"
+#include "platform/posix/regedit_file.h"
+
+namespace kpx::posix {
+
+// A registry backed by a REGEDIT4 file that a user can read and edit. The
+// file is read when the object is made and written back after every change.
+// With an empty path the registry lives in memory only.
+class FileRegistry final : public platform::Registry {
+ public:
+  explicit FileRegistry(std::filesystem::path file = {});
+
+  std::optional<platform::RegistryValue> QueryValue(platform::RootKey root, std::string_view key,
+                                                    std::string_view name) override;
+  bool SetValue(platform::RootKey root, std::string_view key, std::string_view name,
+                const platform::RegistryValue& value) override;
+  platform::KeyDisposition CreateKey(platform::RootKey root, std::string_view key) override;
+  // The native build's code page is UTF-8: text passes unchanged.
+  std::string ToAnsi(std::string_view utf8) override { return std::string(utf8); }
+  std::string FromAnsi(std::string_view ansi) override { return std::string(ansi); }
+
+  RegeditData& data() { return data_; }
+  void Save();
+
+ private:
+  std::filesystem::path file_;
+  RegeditData data_;
+};
+
+// Windows paths ("C:\dir\f.txt") map to <sandbox>/C/dir/f.txt; a path
+// without a drive letter is taken relative to the sandbox's "C" drive.
+class SandboxFileSystem final : public platform::FileSystem {
+ public:
+  explicit SandboxFileSystem(std::filesystem::path sandbox);
+
+  bool Exists(std::string_view path) override;
+  bool DeleteFile(std::string_view path) override;
+  bool AppendText(std::string_view path, std::string_view text) override;
+
+  std::filesystem::path HostPath(std::string_view windowsPath) const;
+  const std::filesystem::path& sandbox() const { return sandbox_; }
+
+ private:
+  std::filesystem::path sandbox_;
+};
+
+// The machine's clock in local time.
+class SystemClock final : public platform::Clock {
+ public:
+  float Timer() override;
+  platform::DateTime Now() override;
+  void Sleep(uint32_t milliseconds) override;
+};
+
+}  // namespace kpx::posix
