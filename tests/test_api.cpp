@@ -1,0 +1,221 @@
+#include <gtest/gtest.h>
+
+#include "addin/api.h"
+#include "addin/api_members.h"
+#include "addin/find_addin.h"
+#include "fakes.h"
+#include "shared/host_ids.h"
+#include "shared/shared_registryapi2.h"
+
+namespace kpx {
+namespace {
+
+using test::FakeObject;
+
+// A host application with the named add-ins, journaling into `journal`.
+struct FakeHost {
+  explicit FakeHost(test::Journal* journal, std::vector<std::string> names) : journal(journal) {
+    app = std::make_shared<FakeObject>("app", journal);
+    auto manager = std::make_shared<FakeObject>("manager", journal);
+    auto collection = std::make_shared<FakeObject>("addins", journal);
+    for (size_t i = 0; i < names.size(); ++i) {
+      auto addIn = std::make_shared<FakeObject>(names[i] + "#" + std::to_string(i + 1), journal);
+      std::string name = names[i];
+      addIn->On(hostid::kAddInName, "Name", [name](std::span<Variant>) -> Variant { return name; })
+          .On(hostid::kActivate, "Activate", nullptr)
+          .On(hostid::kDeactivate, "Deactivate", nullptr);
+      addIns.push_back(addIn);
+    }
+    collection->On(hostid::kCount, "Count", [this](std::span<Variant>) -> Variant {
+      return static_cast<int16_t>(addIns.size());
+    });
+    collection->On(hostid::kGetAt, "GetAt", [this](std::span<Variant> a) -> Variant {
+      return ObjectPtr(addIns.at(static_cast<size_t>(a[0].toInt16() - 1)));
+    });
+    manager->On(hostid::kAddIns, "AddIns", [collection](std::span<Variant>) -> Variant { return ObjectPtr(collection); });
+    app->On(hostid::kAddInManager, "AddInManager", [manager](std::span<Variant>) -> Variant { return ObjectPtr(manager); })
+        .On(hostid::kWriteErrorLog, "WriteErrorLog", nullptr);
+  }
+  test::Journal* journal;
+  std::shared_ptr<FakeObject> app;
+  std::vector<std::shared_ptr<FakeObject>> addIns;
+};
+
+class ApiTest : public ::testing::Test {
+ protected:
+  void DebugMask(int32_t mask) {
+    world.registry.CreateKey(RootKey::LocalMachine, kDebugSettingsKey);
+    RegistrySetValue(world.registry, RootKey::LocalMachine, kDebugSettingsKey, "Debug", Variant(mask), platform::kRegDword);
+    RegistrySetValue(world.registry, RootKey::LocalMachine, kDebugSettingsKey, "SuppressTimeStamps", Variant("true"),
+                     platform::kRegSz);
+  }
+  void SwitchOff(const std::string& addIn) {
+    const std::string key = "SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\" + addIn;
+    world.registry.CreateKey(RootKey::CurrentUser, key);
+    RegistrySetValue(world.registry, RootKey::CurrentUser, key, "Active", Variant("No"), platform::kRegSz);
+  }
+  std::string Log() { return world.files.at("C:\\tzndebuglog.txt"); }
+
+  test::World world;
+  platform::Platform platform = world.platform();
+  Module module{platform};
+};
+
+TEST_F(ApiTest, ConstructionLoadsMessagesThenMenuTextsInOrder) {
+  auto api = CreateApi(module);
+  std::vector<int32_t> menuIds(world.resourceIds.begin() + 23, world.resourceIds.end());
+  EXPECT_EQ(menuIds, (std::vector<int32_t>{5001, 5002, 5003, 5004, 5005, 5006, 5007, 5008, 5009, 5038, 5041, 5042,
+                                           5039, 5043, 5044, 5052, 5053, 5054, 5040, 5051}));
+  EXPECT_EQ(api->menuText(MenuText::ImplementInterface), "T5039");
+  EXPECT_EQ(api->menuText(MenuText::AtlSubmenu), "Submenu T5040");
+  EXPECT_EQ(api->menuText(MenuText::ExpandSubmenu), "Submenu T5051");
+  EXPECT_EQ(api->menuText(MenuText::EndSubmenu), "endsubmenu");
+  EXPECT_TRUE(api->WarnReversedRealize && api->WarnRealizeNonInterface && api->WarnCoclassModified &&
+              api->WarnMultipleInterfaceBase);
+}
+
+TEST_F(ApiTest, ConstructionFailsWithoutTheResourceComponent) {
+  world.factory.makers.clear();
+  EXPECT_THROW(CreateApi(module), AutomationError);
+}
+
+TEST_F(ApiTest, FindAddInTakesTheFirstExactMatchAndSwallowsFailures) {
+  FakeHost host(&world.journal, {"VisualStudio", "VC++", "VisualStudio"});
+  EXPECT_EQ(FindAddIn(host.app, "VisualStudio"), host.addIns[0]);
+  EXPECT_EQ(FindAddIn(host.app, "VC++"), host.addIns[1]);
+  EXPECT_EQ(FindAddIn(host.app, "vc++"), nullptr);
+  EXPECT_EQ(FindAddIn(host.app, "Missing"), nullptr);
+  EXPECT_EQ(FindAddIn(nullptr, "VC++"), nullptr);
+  auto bare = std::make_shared<FakeObject>("bare", nullptr);
+  EXPECT_EQ(FindAddIn(bare, "VC++"), nullptr);
+}
+
+TEST_F(ApiTest, ActivationDeletesTheLogThenLogsFindsItselfAndWakesTheSibling) {
+  DebugMask(0x7F000080);
+  world.files.at("C:\\tzndebuglog.txt") = "old run\r\n";
+  SwitchOff("VisualStudio");
+  world.texts[5030] = "VisualStudio add-in was off";
+  FakeHost host(&world.journal, {"VC++", "VisualStudio"});
+  auto api = CreateApi(module);
+  world.journal.clear();
+
+  ObjectPtr app = host.app;
+  EXPECT_EQ(api->OnActivate(app), 0);
+  EXPECT_EQ(api->QuarnApp(), host.app);
+  EXPECT_EQ(world.journal,
+            (test::Journal{"delete C:\\tzndebuglog.txt",
+                           // FindAddIn(VC++): stops at the first add-in
+                           "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
+                           "app.WriteErrorLog VisualStudio add-in was off",
+                           // GetVisualStudioAddIn
+                           "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
+                           "addins.GetAt 2", "VisualStudio#2.Name", "VisualStudio#2.Activate"}));
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n");
+}
+
+TEST_F(ApiTest, ActivationWithMaskZeroKeepsTheLogAndAnActiveSiblingIsLeftAlone) {
+  world.files.at("C:\\tzndebuglog.txt") = "old run\r\n";
+  FakeHost host(&world.journal, {"VisualStudio"});
+  auto api = CreateApi(module);
+  ObjectPtr app = host.app;
+  api->OnActivate(app);
+  EXPECT_EQ(Log(), "old run\r\n");
+  EXPECT_EQ(host.addIns[0]->calls, 1);  // its Name, while looking for "VC++"
+}
+
+TEST_F(ApiTest, InitTimeIsLoggedOnlyWhenTheClockMovedForward) {
+  DebugMask(0x7F000080);
+  FakeHost host(&world.journal, {});
+  auto api = CreateApi(module);
+  ObjectPtr app = host.app;
+
+  world.clock.step = 2.5f;  // end - start = 2.5 rounds to 2
+  api->OnActivate(app);
+  EXPECT_NE(Log().find("kpxAddin.OnActivate: Init time=2 Seconds.\r\n"), std::string::npos) << Log();
+
+  world.clock.step = -1.0f;  // midnight passed
+  api->OnActivate(app);
+  EXPECT_EQ(Log().find("Init time"), std::string::npos) << Log();
+}
+
+TEST_F(ApiTest, DeactivationReleasesCompanionsThroughTheirTerminators) {
+  test::Journal& j = world.journal;
+  auto lang = std::make_shared<FakeObject>("lang", &j);
+  lang->On(31, "Init", nullptr).On(32, "Show", nullptr).On(33, "Terminate", nullptr);
+  lang->Operation(1, 31).Operation(2, 32).Operation(3, 33);
+  auto comp = std::make_shared<FakeObject>("comp", &j);
+  comp->On(41, "Init", nullptr).On(42, "Terminate", nullptr).Operation(1, 41).Operation(2, 42);
+  int langMade = 0;
+  world.factory.makers["{05D99488-AB9F-11D2-B9EB-006008BF3ACB}"] = [&] { ++langMade; return lang; };
+  world.factory.makers["{CFD996E3-1393-11D3-B9F3-006008BF3ACB}"] = [&] { return comp; };
+  FakeHost host(&j, {});
+  auto api = CreateApi(module);
+  ObjectPtr app = host.app;
+
+  EXPECT_EQ(api->QuarnApp(), nullptr);
+  api->OnActivate(app);
+  EXPECT_EQ(api->LangPropertiesAPI(), lang);
+  EXPECT_EQ(api->LangPropertiesAPI(), lang);
+  EXPECT_EQ(api->CompPropertiesAPI(), comp);
+  j.clear();
+  api->OnDeactivate(app);
+  EXPECT_EQ(j, (test::Journal{"lang.Terminate", "comp.Terminate", "DoEvents"}));
+  EXPECT_EQ(api->QuarnApp(), nullptr);
+  api->LangPropertiesAPI();
+  EXPECT_EQ(langMade, 2);  // made anew after deactivation
+}
+
+TEST_F(ApiTest, AMissingLanguageCompanionIsLoggedAndGivesNothing) {
+  DebugMask(0x7F000080);
+  auto api = CreateApi(module);
+  EXPECT_EQ(api->LangPropertiesAPI(), nullptr);
+  EXPECT_NE(Log().find("ERROR    ADDIN     kpxAddin.Get LangPropertiesAPI(): ActiveX component can't create object"),
+            std::string::npos)
+      << Log();
+  EXPECT_EQ(api->CompPropertiesAPI(), nullptr);
+  EXPECT_EQ(api->TypeLibImporter(), nullptr);
+}
+
+TEST_F(ApiTest, DestructionLogsAndReleasesTheSharedResourceObject) {
+  DebugMask(0x7F000080);
+  {
+    auto api = CreateApi(module);
+    EXPECT_EQ(world.factory.created.size(), 1u);
+  }
+  EXPECT_NE(Log().find("kpxAddin.Class_Terminate"), std::string::npos);
+  module.resources().GetResourceObject();
+  EXPECT_EQ(world.factory.created.size(), 2u);  // the shared object was released
+}
+
+TEST_F(ApiTest, AutomationCallsCheckNamesArgumentsAndUnbuiltMembers) {
+  auto api = CreateApi(module);
+  ObjectPtr obj = api;
+  EXPECT_EQ(CallByName(obj, "name", CallKind::PropertyGet), Variant("VC++"));
+  EXPECT_NE(CallByName(obj, "Name", CallKind::PropertyGet), Variant("vc++"));
+
+  auto errorOf = [&](std::string_view member, std::initializer_list<Variant> args) {
+    try {
+      CallByName(obj, member, CallKind::Method, args);
+    } catch (const AutomationError& e) {
+      return e.number();
+    }
+    return 0;
+  };
+  EXPECT_EQ(errorOf("NoSuchMember", {}), vberr::kNoSuchMember);
+  EXPECT_EQ(errorOf("OnAppInit", {}), vberr::kArgNotOptional);
+  EXPECT_EQ(errorOf("OnAppInit", {Variant::Nothing(), Variant(1)}), vberr::kWrongArgCount);
+  EXPECT_EQ(errorOf("OnAppInit", {Variant(1)}), vberr::kObjectRequired);
+  EXPECT_EQ(errorOf("OnAppInit", {Variant::Nothing()}), 0);
+  EXPECT_EQ(errorOf("OnRestoreSource", {Variant::Nothing()}), vberr::kNotImplemented);
+  EXPECT_EQ(errorOf("CanDropFileOnItem", {Variant::Nothing(), Variant::Nothing(), Variant("f.h")}), 0);
+
+  // Every member the add-in lists is reachable by name at its position.
+  std::span<const ApiMember> members = ApiMembers();
+  ASSERT_EQ(members.size(), 69u);
+  for (size_t i = 0; i < members.size(); ++i) EXPECT_EQ(api->IdOfName(members[i].name), static_cast<DispId>(i + 1));
+  EXPECT_STREQ(members[0].name, "OnSelectedContextMenuItem");
+  EXPECT_STREQ(members[68].name, "OnDeletedModelElement");
+}
+
+}  // namespace
+}  // namespace kpx
