@@ -4,7 +4,9 @@
 
 #include <filesystem>
 #include <map>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "platform/platform.h"
 #include "platform/posix/regedit_file.h"
@@ -28,9 +30,15 @@ class FileRegistry final : public platform::Registry {
   std::string FromAnsi(std::string_view ansi) override { return std::string(ansi); }
 
   RegeditData& data() { return data_; }
+  // Writes the file (nothing to do without one); raises std::runtime_error
+  // when it cannot be written, leaving the previous file as it was.
   void Save();
 
  private:
+  // "HKEY_...\key"; nothing for a root this registry does not hold.
+  static std::optional<std::string> FullKey(platform::RootKey root, std::string_view key);
+  bool KeyExists(const std::string& fullKey) const;
+
   std::filesystem::path file_;
   RegeditData data_;
 };

@@ -1,0 +1,285 @@
+#include "platform/posix/posix_platform.h"
+
+#include <algorithm>
+#include <chrono>
+#include <ctime>
+#include <fstream>
+#include <iterator>
+#include <stdexcept>
+#include <system_error>
+#include <thread>
+#include <vector>
+
+namespace kpx::posix {
+
+namespace fs = std::filesystem;
+
+namespace {
+
+char Lower(char c) { return (c >= 'A' && c <= 'Z') ? static_cast<char>(c - 'A' + 'a') : c; }
+char Upper(char c) { return (c >= 'a' && c <= 'z') ? static_cast<char>(c - 'a' + 'A') : c; }
+
+bool EqualNoCase(std::string_view a, std::string_view b) {
+  return a.size() == b.size() &&
+         std::equal(a.begin(), a.end(), b.begin(), [](char x, char y) { return Lower(x) == Lower(y); });
+}
+
+bool IsSeparator(char c) { return c == '\\' || c == '/'; }
+
+}  // namespace
+
+// ---------------------------------------------------------------- registry
+
+FileRegistry::FileRegistry(fs::path file) : file_(std::move(file)) {
+  if (file_.empty()) return;
+  std::error_code ec;
+  if (!fs::exists(file_, ec)) return;
+  std::ifstream in(file_, std::ios::binary);
+  if (!in) throw std::runtime_error(file_.string() + ": cannot be read");
+  std::string text((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+  try {
+    data_ = ParseRegedit(text);
+  } catch (const std::runtime_error& e) {
+    throw std::runtime_error(file_.string() + ": " + e.what());
+  }
+}
+
+// Written beside the target and renamed over it, so that a failed write
+// leaves the previous file whole.
+void FileRegistry::Save() {
+  if (file_.empty()) return;
+  const std::string text = WriteRegedit(data_);
+  fs::path temp = file_;
+  temp += ".tmp";
+  {
+    std::ofstream out(temp, std::ios::binary | std::ios::trunc);
+    out << text;
+    out.close();
+    if (!out) {
+      std::error_code ignored;
+      fs::remove(temp, ignored);
+      throw std::runtime_error(file_.string() + ": cannot be written");
+    }
+  }
+  std::error_code ec;
+  fs::rename(temp, file_, ec);
+  if (ec) {
+    std::error_code ignored;
+    fs::remove(temp, ignored);
+    throw std::runtime_error(file_.string() + ": cannot be replaced: " + ec.message());
+  }
+}
+
+std::optional<std::string> FileRegistry::FullKey(platform::RootKey root, std::string_view key) {
+  std::string full = RootKeyName(root);
+  if (full.empty()) return std::nullopt;
+  if (!key.empty()) {
+    full += '\\';
+    full += key;
+  }
+  return full;
+}
+
+// A key exists when the file names it, when it is a root, or when the file
+// names a key below it: Windows cannot hold a key without its parents.
+bool FileRegistry::KeyExists(const std::string& full) const {
+  if (full.find('\\') == std::string::npos) return true;
+  if (data_.count(full)) return true;
+  const std::string prefix = full + "\\";
+  auto it = data_.lower_bound(prefix);
+  return it != data_.end() && it->first.size() > prefix.size() &&
+         EqualNoCase(std::string_view(it->first).substr(0, prefix.size()), prefix);
+}
+
+std::optional<platform::RegistryValue> FileRegistry::QueryValue(platform::RootKey root, std::string_view key,
+                                                                std::string_view name) {
+  std::optional<std::string> full = FullKey(root, key);
+  if (!full) return std::nullopt;
+  auto k = data_.find(*full);
+  if (k == data_.end()) return std::nullopt;
+  auto v = k->second.find(std::string(name));
+  if (v == k->second.end()) return std::nullopt;
+  return v->second;
+}
+
+// The registry call either takes effect or does not: a change that cannot
+// reach the file is taken back, so memory and file never disagree.
+bool FileRegistry::SetValue(platform::RootKey root, std::string_view key, std::string_view name,
+                            const platform::RegistryValue& value) {
+  std::optional<std::string> full = FullKey(root, key);
+  if (!full || !KeyExists(*full)) return false;
+  const RegeditData before = data_;
+  data_[*full][std::string(name)] = value;
+  try {
+    Save();
+  } catch (const std::exception&) {
+    data_ = before;
+    return false;
+  }
+  return true;
+}
+
+platform::KeyDisposition FileRegistry::CreateKey(platform::RootKey root, std::string_view key) {
+  std::optional<std::string> full = FullKey(root, key);
+  if (!full) return platform::KeyDisposition::Failed;
+  if (KeyExists(*full)) return platform::KeyDisposition::Opened;
+  data_.emplace(*full, RegeditValues{});
+  try {
+    Save();
+  } catch (const std::exception&) {
+    data_.erase(*full);
+    return platform::KeyDisposition::Failed;
+  }
+  return platform::KeyDisposition::Created;
+}
+
+// ------------------------------------------------------------------- files
+
+SandboxFileSystem::SandboxFileSystem(fs::path sandbox) : sandbox_(std::move(sandbox)) {}
+
+namespace {
+
+// The sandbox folders a Windows path walks through, drive or UNC first.
+// Empty and "." components are dropped (a trailing backslash names the same
+// folder); ".." climbs but never above the drive or share, so no path
+// leaves the sandbox.
+std::vector<std::string> WindowsComponents(std::string_view path) {
+  std::vector<std::string> parts;
+  size_t fixed = 1;
+  if (path.size() >= 2 && IsSeparator(path[0]) && IsSeparator(path[1])) {
+    parts.push_back("UNC");
+    path.remove_prefix(2);
+    fixed = 3;  // UNC, server, share
+  } else if (path.size() >= 2 && path[1] == ':' &&
+             ((path[0] >= 'A' && path[0] <= 'Z') || (path[0] >= 'a' && path[0] <= 'z'))) {
+    parts.push_back(std::string(1, Upper(path[0])));
+    path.remove_prefix(2);
+  } else {
+    parts.push_back("C");
+  }
+  while (!path.empty()) {
+    size_t sep = 0;
+    while (sep < path.size() && !IsSeparator(path[sep])) ++sep;
+    std::string_view part = path.substr(0, sep);
+    path.remove_prefix(std::min(sep + 1, path.size()));
+    if (part.empty() || part == ".") continue;
+    if (part == "..") {
+      if (parts.size() > fixed) parts.pop_back();
+      continue;
+    }
+    parts.emplace_back(part);
+  }
+  return parts;
+}
+
+// The entry of `dir` that matches `name`: the exact spelling when present,
+// otherwise the first (by byte order) that differs only in case.
+fs::path ResolveComponent(const fs::path& dir, const std::string& name) {
+  std::error_code ec;
+  fs::path exact = dir / name;
+  if (fs::exists(fs::symlink_status(exact, ec))) return exact;
+  std::optional<std::string> best;
+  for (fs::directory_iterator it(dir, ec), end; !ec && it != end; it.increment(ec)) {
+    std::string entry = it->path().filename().string();
+    if (EqualNoCase(entry, name) && (!best || entry < *best)) best = entry;
+  }
+  return best ? dir / *best : exact;
+}
+
+bool EndsWithSeparator(std::string_view path) { return !path.empty() && IsSeparator(path.back()); }
+
+}  // namespace
+
+fs::path SandboxFileSystem::HostPath(std::string_view windowsPath) const {
+  fs::path host = sandbox_;
+  bool resolving = true;  // once a component is missing, nothing below it exists either
+  for (const std::string& part : WindowsComponents(windowsPath)) {
+    if (resolving) {
+      host = ResolveComponent(host, part);
+      std::error_code ec;
+      resolving = fs::is_directory(host, ec);
+    } else {
+      host /= part;
+    }
+  }
+  return host;
+}
+
+bool SandboxFileSystem::Exists(std::string_view path) {
+  if (path.empty()) return false;
+  std::error_code ec;
+  return fs::exists(HostPath(path), ec);
+}
+
+bool SandboxFileSystem::DeleteFile(std::string_view path) {
+  if (path.empty() || EndsWithSeparator(path)) return false;
+  const fs::path host = HostPath(path);
+  std::error_code ec;
+  if (!fs::is_regular_file(host, ec)) return false;
+  return fs::remove(host, ec) && !ec;
+}
+
+bool SandboxFileSystem::AppendText(std::string_view path, std::string_view text) {
+  // "C:\logs\" names a folder, never a file to append to.
+  if (path.empty() || EndsWithSeparator(path)) return false;
+  const fs::path host = HostPath(path);
+  std::error_code ec;
+  // Like CreateFile, never make a missing folder on the way.
+  if (!fs::is_directory(host.parent_path(), ec)) return false;
+  if (fs::is_directory(host, ec)) return false;
+  std::ofstream out(host, std::ios::binary | std::ios::app);
+  if (!out) return false;
+  out.write(text.data(), static_cast<std::streamsize>(text.size()));
+  out.close();
+  return static_cast<bool>(out);
+}
+
+// ------------------------------------------------------------------- clock
+
+namespace {
+
+struct LocalNow {
+  std::tm tm{};
+  double fraction = 0;  // of the current second
+};
+
+LocalNow ReadLocalNow() {
+  using namespace std::chrono;
+  const auto now = system_clock::now();
+  const std::time_t t = system_clock::to_time_t(now);
+  LocalNow local;
+  localtime_r(&t, &local.tm);
+  const auto sinceSecond = now - system_clock::from_time_t(t);
+  local.fraction = duration<double>(sinceSecond).count();
+  // to_time_t may round rather than truncate; keep the fraction in [0, 1).
+  if (local.fraction < 0) local.fraction = 0;
+  if (local.fraction >= 1) local.fraction = 0.999999;
+  return local;
+}
+
+}  // namespace
+
+float SystemClock::Timer() {
+  const LocalNow now = ReadLocalNow();
+  const int second = std::min(now.tm.tm_sec, 59);  // a leap second counts as the one before
+  const double seconds = now.tm.tm_hour * 3600.0 + now.tm.tm_min * 60.0 + second + now.fraction;
+  return static_cast<float>(seconds);
+}
+
+platform::DateTime SystemClock::Now() {
+  const LocalNow now = ReadLocalNow();
+  platform::DateTime d;
+  d.year = now.tm.tm_year + 1900;
+  d.month = now.tm.tm_mon + 1;
+  d.day = now.tm.tm_mday;
+  d.hour = now.tm.tm_hour;
+  d.minute = now.tm.tm_min;
+  d.second = std::min(now.tm.tm_sec, 59);
+  return d;
+}
+
+void SystemClock::Sleep(uint32_t milliseconds) {
+  std::this_thread::sleep_for(std::chrono::milliseconds(milliseconds));
+}
+
+}  // namespace kpx::posix
