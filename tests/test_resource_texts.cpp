@@ -128,12 +128,12 @@ TEST(ResourceTexts, ReadOnlyMessageStartsWithPrefixAndPath) {
 }
 
 TEST(ResourceTexts, BackupFolderMakesAValidListPath) {
-  // A project's list file lies at the project folder (no trailing
+  // A project's list file lies at the project folder (with its trailing
   // backslash) + the backup folder text + "\" + project + ".lst".
-  std::string path = "C:\\Work\\App" + TextOf(5029) + "\\App.lst";
+  std::string path = "C:\\Work\\App\\" + TextOf(5029) + "\\App.lst";
   EXPECT_EQ(path.rfind("C:\\Work\\App\\", 0), 0u) << path;
   EXPECT_EQ(path.find("\\\\"), std::string::npos) << path;
-  std::string folder = TextOf(5029).substr(1);
+  std::string folder = TextOf(5029);
   EXPECT_FALSE(folder.empty());
   EXPECT_EQ(folder.find_first_of("\\/:*?\"<>|"), std::string::npos) << folder;
 }

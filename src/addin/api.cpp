@@ -115,7 +115,7 @@ ObjectPtr API::TypeLibImporter() {
     });
     // The importer's host-application property; its interface names it "QuarnApp".
     onError([&] {
-      PutPropertyRef(theTypeLibImporter_, theTypeLibImporter_->IdOfName("QuarnApp"), Variant(theQuarnApp_));
+      CallByName(theTypeLibImporter_, "QuarnApp", CallKind::PropertyPutRef, {Variant(theQuarnApp_)});
     });
   }
   return theTypeLibImporter_;
@@ -137,6 +137,11 @@ int32_t API::OnActivate(ObjectPtr& QuarnApp) {
   ObjectPtr ownAddIn = FindAddIn(QuarnApp, "VC++");
   onError.Clear();
 
+  // Without its partner inside Developer Studio the add-in does not stay active.
+  bool registered = false;
+  onError([&] { registered = RegisterIDEAddIn(QuarnApp); });
+  if (!registered) onError([&] { CallMethod(ownAddIn, hostid::kDeactivate); });
+
   if (!IsAddInActive(world.registry, QuarnApp, "VisualStudio")) {
     onError([&] {
       std::string text = module_.resources().LoadResString(5030);
@@ -144,6 +149,13 @@ int32_t API::OnActivate(ObjectPtr& QuarnApp) {
     });
     onError([&] { CallMethod(GetVisualStudioAddIn(QuarnApp), hostid::kActivate); });
   }
+
+  bool menus = false;
+  onError([&] {
+    menus = BuildContextMenus(QuarnApp, ownAddIn);
+    if (menus) menus = BuildUserCommandMenus(QuarnApp, ownAddIn);
+  });
+  if (!menus) module_.DebugLog("kpxAddin.OnActivate : Context menus not supported", logid::ADDIN, loglevel::ERROR);
 
   const float endTime = world.clock.Timer();
   if (endTime > startTime) {

@@ -5,11 +5,14 @@
 
 #include <array>
 #include <cstdint>
+#include <map>
 #include <span>
+#include <vector>
 #include <string>
 #include <string_view>
 
 #include "automation/object.h"
+#include "automation/vb_strings.h"
 #include "shared/module.h"
 
 namespace kpx {
@@ -71,11 +74,72 @@ class API final : public Object {
   int32_t OnDeactivate(ObjectPtr& QuarnApp);
   int32_t OnAppInit(ObjectPtr& QuarnApp);
 
+  // Round-trip commands, forwarded to the "VisualStudio" add-in or the
+  // component-properties companion.
+  int32_t OnBrowseComponent(ObjectPtr& QuarnApp);
+  int32_t OnBrowseBody(ObjectPtr& QuarnApp);
+  int32_t OnBrowseHeader(ObjectPtr& QuarnApp);
+  int32_t OnGenerateCode(ObjectPtr& QuarnApp);
+  int32_t OnModelUpdate(ObjectPtr& QuarnApp);
+  int32_t OnModelUpdateSelection(ObjectPtr& QuarnApp);
+  int32_t OnComponentAssignment(ObjectPtr& QuarnApp);
+
+  // Companion launchers.
+  ObjectPtr ModelAssistantAPI();
+  ObjectPtr StatementGenerator();
+  ObjectPtr CodeViewProject();
+  int32_t OnModelAssistant(ObjectPtr& QuarnApp);
+  int32_t OnModelConverter(ObjectPtr& QuarnApp);
+  int32_t OnClassWizard(ObjectPtr& QuarnApp);
+  int32_t OnImportMFC(ObjectPtr& QuarnApp);
+  Variant OnLangProperties(ObjectPtr& QuarnApp, const Variant& lPage);
+  int32_t OnExpand2ATLObject(ObjectPtr& QuarnApp);
+  int32_t OnNewATLObject(ObjectPtr& QuarnApp);
+  int32_t OnAddMethod(ObjectPtr& QuarnApp);
+  int32_t OnAddProperty(ObjectPtr& QuarnApp);
+  int32_t OnImplementInterfaces(ObjectPtr& QuarnApp);
+  int32_t OnExposeProperty(ObjectPtr& QuarnApp);
+
+  // Context menus.
+  bool OnSelectedContextMenuItem(ObjectPtr& QuarnApp, std::string& internalName);
+  void OnEnableContextMenuItems(ObjectPtr& QuarnApp, int16_t& itemType);
+  Variant ValidateComponent(const ObjectPtr& item, int16_t& count, bool& hasVC, bool& failed);
+  int32_t OnUser(int slot, ObjectPtr& QuarnApp);  // OnUser1 .. OnUser5
+  int32_t OnHowTo(ObjectPtr& QuarnApp);
+  int32_t OnFAQ(ObjectPtr& QuarnApp);
+
+  // Language identity.
+  bool IsLanguageOperational() const { return true; }
+  std::string LanguageName() const { return "VC++"; }
+  std::string LanguageInfo() const { return "Microsoft Visual C++"; }
+  int32_t LanguageId() const { return 0; }
+  std::string GetLocation(const std::string& path, bool useDefault);
+
   const std::string& menuText(MenuText which) const { return menuTexts_[static_cast<size_t>(which)]; }
   Module& module() { return module_; }
+  // The menu entries the host returned, by key, as the last build left them.
+  std::vector<std::string> menuItemKeys() const;
+  ObjectPtr menuItem(std::string_view key) const;
+  // The user commands' automation object names, by slot ("OnUser1" ..).
+  const std::map<std::string, std::string, NoCaseLess>& userCommands() const { return UserCommands_; }
 
  private:
   void ReleaseObjects();
+  bool RegisterIDEAddIn(const ObjectPtr& QuarnApp);
+  bool BuildContextMenus(const ObjectPtr& QuarnApp, const ObjectPtr& addIn);
+  bool BuildUserCommandMenus(const ObjectPtr& QuarnApp, const ObjectPtr& addIn);
+  bool DispatchUserCommand(ObjectPtr& QuarnApp, const std::string& internalName);
+  bool CreateUserCommandObject(const std::string& slot, const ObjectPtr& QuarnApp, ObjectPtr& object);
+  void StartModelUpdate(ObjectPtr& QuarnApp, bool selectionOnly);
+  int32_t ForwardToVisualStudio(ObjectPtr& QuarnApp, const char* event);
+  bool IsBrowsableSelection(const ObjectPtr& QuarnApp);
+  int32_t Browse(ObjectPtr& QuarnApp, const char* trace, int operation);
+  int32_t LaunchAtlTool(ObjectPtr& QuarnApp, const char* member, const char* trace);
+  int32_t LaunchCompanion(ObjectPtr& QuarnApp, const char* progId, const char* member, const char* traceName,
+                          const char* prefix);
+  bool CheckComponent(const ObjectPtr& component);
+  void SetMenuState(const char* key, bool enabled);
+  void ExpandClassDiagram(const ObjectPtr& QuarnApp, const ObjectPtr& classes, bool clients);
 
   Module& module_;
   ObjectPtr theFirstObject_;  // a companion cache the host never fills; cleared with the rest
@@ -86,6 +150,14 @@ class API final : public Object {
   ObjectPtr theModelAssistantAPI_;
   ObjectPtr theTypeLibImporter_;
   std::array<std::string, static_cast<size_t>(MenuText::Count)> menuTexts_;
+  // Keyed collections; the host's keys compare without regard to case, as
+  // the host's own collections do.
+  struct MenuEntry {
+    ObjectPtr object;
+    DispId menuState = 0;  // resolved on the first write, then reused
+  };
+  std::map<std::string, MenuEntry, NoCaseLess> MenuItems_;
+  std::map<std::string, std::string, NoCaseLess> UserCommands_;
 
  public:
   // Cleared when the user silences the matching warning.

@@ -63,6 +63,15 @@ bool EqualsNoCase(std::string_view a, std::string_view b) {
   return true;
 }
 
+bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
+  const size_t n = a.size() < b.size() ? a.size() : b.size();
+  for (size_t i = 0; i < n; ++i) {
+    int x = std::tolower(static_cast<unsigned char>(a[i])), y = std::tolower(static_cast<unsigned char>(b[i]));
+    if (x != y) return x < y;
+  }
+  return a.size() < b.size();
+}
+
 double Val(std::string_view s) {
   std::string t;
   for (char c : s)

@@ -34,6 +34,12 @@ std::string Right(std::string_view s, size_t length);
 // Case-insensitive equality (StrComp with vbTextCompare == 0) for ASCII text.
 bool EqualsNoCase(std::string_view a, std::string_view b);
 
+// Orders keys without regard to case, as VB's keyed collections compare them.
+struct NoCaseLess {
+  bool operator()(std::string_view a, std::string_view b) const;
+  using is_transparent = void;
+};
+
 // Val: the leading number of a text (blanks skipped, stops at the first
 // character that cannot continue it), 0 when there is none. "&H" hex is read.
 double Val(std::string_view s);

@@ -74,8 +74,8 @@ constexpr std::array<ResourceText, 78> kTexts = {{
     // restore source: name of the settings section holding the backup records
     {5028, "Backups"},
     // restore source: backup sub-folder, placed between the project's folder
-    // (which has no trailing backslash) and "\" + project + ".lst"
-    {5029, "\\Backup"},
+    // (which keeps its trailing backslash) and "\" + project + ".lst"
+    {5029, "Backup"},
     // activation, host log: the VisualStudio add-in was off and is switched on
     {5030,
      "The VisualStudio add-in is not active. The VC++ add-in needs it for round-trip engineering "
