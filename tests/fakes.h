@@ -51,7 +51,10 @@ class FakeObject : public Object {
   }
   Variant Invoke(DispId id, CallKind, std::span<Variant> args) override {
     auto it = members_.find(id);
-    if (it == members_.end()) throw AutomationError(vberr::kNoSuchMember);
+    if (it == members_.end()) {
+      if (journal_) journal_->push_back(label_ + ".?" + std::to_string(id));
+      throw AutomationError(vberr::kNoSuchMember);
+    }
     if (journal_) {
       std::string entry = label_ + "." + it->second.name;
       for (const Variant& a : args)

@@ -23,7 +23,18 @@ struct FakeHost {
       std::string name = names[i];
       addIn->On(hostid::kAddInName, "Name", [name](std::span<Variant>) -> Variant { return name; })
           .On(hostid::kActivate, "Activate", nullptr)
-          .On(hostid::kDeactivate, "Deactivate", nullptr);
+          .On(hostid::kDeactivate, "Deactivate", nullptr)
+          .On(hostid::kReadSetting, "ReadSetting",
+              [this](std::span<Variant> a) -> Variant {
+                auto it = settings.find(a[1].toString());
+                return it == settings.end() ? a[2].deref() : Variant(it->second);
+              })
+          .On(hostid::kAddContextMenuItem, "AddContextMenuItem", [this](std::span<Variant> a) -> Variant {
+            auto entry = std::make_shared<FakeObject>("menu:" + a[2].toString(), nullptr);
+            entry->On(1, "MenuState", nullptr);
+            menuEntries.push_back(entry);
+            return ObjectPtr(entry);
+          });
       addIns.push_back(addIn);
     }
     collection->On(hostid::kCount, "Count", [this](std::span<Variant>) -> Variant {
@@ -34,8 +45,11 @@ struct FakeHost {
     });
     manager->On(hostid::kAddIns, "AddIns", [collection](std::span<Variant>) -> Variant { return ObjectPtr(collection); });
     app->On(hostid::kAddInManager, "AddInManager", [manager](std::span<Variant>) -> Variant { return ObjectPtr(manager); })
-        .On(hostid::kWriteErrorLog, "WriteErrorLog", nullptr);
+        .On(hostid::kWriteErrorLog, "WriteErrorLog", nullptr)
+        .On(hostid::kApplicationPath, "ApplicationPath", [](std::span<Variant>) -> Variant { return "C:\\Quarn\\"; });
   }
+  std::map<std::string, std::string> settings;  // "Events" entries of every add-in
+  std::vector<std::shared_ptr<FakeObject>> menuEntries;
   test::Journal* journal;
   std::shared_ptr<FakeObject> app;
   std::vector<std::shared_ptr<FakeObject>> addIns;
@@ -55,6 +69,13 @@ class ApiTest : public ::testing::Test {
     RegistrySetValue(world.registry, RootKey::CurrentUser, key, "Active", Variant("No"), platform::kRegSz);
   }
   std::string Log() { return world.files.at("C:\\tzndebuglog.txt"); }
+  // Visual C++ 6 and the IDE add-in file, so that activation registers it.
+  void InstallVisualCpp() {
+    const char* key = "SOFTWARE\\Microsoft\\VisualStudio\\6.0\\Setup\\Microsoft Visual C++";
+    world.registry.CreateKey(RootKey::LocalMachine, key);
+    RegistrySetValue(world.registry, RootKey::LocalMachine, key, "ProductDir", Variant("C:\\VC98"), platform::kRegSz);
+    world.files.at("C:\\Quarn\\vc\\dlls\\kpxideaddin.dll") = "";
+  }
 
   test::World world;
   platform::Platform platform = world.platform();
@@ -90,27 +111,64 @@ TEST_F(ApiTest, FindAddInTakesTheFirstExactMatchAndSwallowsFailures) {
   EXPECT_EQ(FindAddIn(bare, "VC++"), nullptr);
 }
 
-TEST_F(ApiTest, ActivationDeletesTheLogThenLogsFindsItselfAndWakesTheSibling) {
+TEST_F(ApiTest, ActivationRunsItsStepsInOrder) {
   DebugMask(0x7F000080);
   world.files.at("C:\\tzndebuglog.txt") = "old run\r\n";
   SwitchOff("VisualStudio");
+  InstallVisualCpp();
   world.texts[5030] = "VisualStudio add-in was off";
   FakeHost host(&world.journal, {"VC++", "VisualStudio"});
+  host.settings["OnUser2"] = "O|Count|Tools.Count";
   auto api = CreateApi(module);
   world.journal.clear();
 
   ObjectPtr app = host.app;
   EXPECT_EQ(api->OnActivate(app), 0);
   EXPECT_EQ(api->QuarnApp(), host.app);
-  EXPECT_EQ(world.journal,
-            (test::Journal{"delete C:\\tzndebuglog.txt",
-                           // FindAddIn(VC++): stops at the first add-in
-                           "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
-                           "app.WriteErrorLog VisualStudio add-in was off",
-                           // GetVisualStudioAddIn
-                           "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
-                           "addins.GetAt 2", "VisualStudio#2.Name", "VisualStudio#2.Activate"}));
-  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n");
+  test::Journal expected{"delete C:\\tzndebuglog.txt",
+                         // FindAddIn(VC++): stops at the first add-in
+                         "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
+                         "app.ApplicationPath",  // the IDE add-in is registered, no message
+                         "app.WriteErrorLog VisualStudio add-in was off",
+                         // GetVisualStudioAddIn
+                         "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1", "VC++#1.Name",
+                         "addins.GetAt 2", "VisualStudio#2.Name", "VisualStudio#2.Activate"};
+  expected.push_back("VC++#1.AddContextMenuItem 4 Separator Separator");
+  ASSERT_GE(world.journal.size(), expected.size() + 41);
+  EXPECT_EQ(test::Journal(world.journal.begin(), world.journal.begin() + static_cast<long>(expected.size())), expected);
+  // 36 catalogue entries, the last of them the operation menu's browse header, then the user commands.
+  EXPECT_EQ(test::Journal(world.journal.begin() + static_cast<long>(expected.size()) + 34, world.journal.end()),
+            (test::Journal{"VC++#1.AddContextMenuItem 6 T5003 COperation_BrowseHeader",
+                           "VC++#1.ReadSetting Events OnUser1 ", "VC++#1.ReadSetting Events OnUser2 ",
+                           "VC++#1.AddContextMenuItem 6 Separator Separator",
+                           "VC++#1.AddContextMenuItem 6 Count UOperation_OnUser2",
+                           "VC++#1.ReadSetting Events OnUser3 ", "VC++#1.ReadSetting Events OnUser4 ",
+                           "VC++#1.ReadSetting Events OnUser5 "}));
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n"
+                   " TRACE    ADDIN     kpxAddin.GetLocation(Path, UseDefault)\r\n");
+  EXPECT_EQ(api->menuItemKeys().size(), 24u);
+  EXPECT_EQ(api->userCommands().at("OnUser2"), "Tools.Count");
+}
+
+TEST_F(ApiTest, ActivationWithoutVisualCppDeactivatesItselfButCarriesOn) {
+  DebugMask(0x7F000080);
+  world.texts[5031] = "no VC6";
+  FakeHost host(&world.journal, {"VC++"});
+  // The own add-in rejects menus: it has no AddContextMenuItem.
+  auto own = std::make_shared<FakeObject>("own", &world.journal);
+  own->On(hostid::kAddInName, "Name", [](std::span<Variant>) -> Variant { return "VC++"; })
+      .On(hostid::kDeactivate, "Deactivate", nullptr);
+  host.addIns[0] = own;
+  auto api = CreateApi(module);
+  world.journal.clear();
+  ObjectPtr app = host.app;
+  api->OnActivate(app);
+  EXPECT_EQ(world.journal, (test::Journal{"delete C:\\tzndebuglog.txt", "app.AddInManager", "manager.AddIns", "addins.Count", "addins.GetAt 1",
+                                          "own.Name", "app.WriteErrorLog no VC6", "own.Deactivate",
+                                          "own.?12684"}));
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n"
+                   " ERROR    ADDIN     kpxAddin.OnActivate : Context menus not supported\r\n");
+  EXPECT_TRUE(api->userCommands().empty());
 }
 
 TEST_F(ApiTest, ActivationWithMaskZeroKeepsTheLogAndAnActiveSiblingIsLeftAlone) {
