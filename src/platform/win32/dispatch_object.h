@@ -1,0 +1,70 @@
+// A foreign IDispatch (a host object, a companion) as an Object of the core.
+#pragma once
+
+#include "platform/win32/win32_api.h"
+
+#include <string_view>
+
+#include "automation/object.h"
+#include "platform/win32/com_bridge.h"
+
+namespace kpx::win32 {
+
+class DispatchObject : public Object {
+ public:
+  // Holds its own reference to `dispatch`.
+  DispatchObject(ComBridge& bridge, IDispatch* dispatch);
+  ~DispatchObject() override;
+  DispatchObject(const DispatchObject&) = delete;
+  DispatchObject& operator=(const DispatchObject&) = delete;
+
+  // GetIDsOfNames; an unknown name is error 438.
+  DispId IdOfName(std::string_view name) override;
+  // The member id of the n-th operation of the object's own interface,
+  // found in its type information: for a dual interface, the n-th vtable
+  // slot after IUnknown's and IDispatch's seven; for a plain dispinterface,
+  // the n-th function it declares.
+  DispId IdOfOwnOperation(int position) override;
+  // IDispatch::Invoke. By-reference arguments travel as VT_BYREF|VT_VARIANT
+  // pointing at temporaries, which are copied back into the caller's
+  // Variants afterwards (also when the call failed: a callee may have
+  // written them before it failed).
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+
+  IDispatch* dispatch() const { return dispatch_; }
+
+ protected:
+  ComBridge& bridge_;
+
+ private:
+  IDispatch* dispatch_;
+};
+
+// The first own operation of an early-bound interface: HRESULT (long, BSTR*)
+// in the vtable slot right after IDispatch's.
+struct IFirstOperationStringById : public IDispatch {
+  virtual HRESULT STDMETHODCALLTYPE FirstOperation(LONG id, BSTR* text) = 0;
+};
+
+// The resource component as the add-in uses it: its interface's first own
+// operation (string by id) is called early-bound through the vtable, as a
+// compiled client of that interface does; everything else goes through
+// IDispatch like any other object.
+class EarlyBoundResourceObject final : public DispatchObject {
+ public:
+  // `object` is the interface pointer for `iid`, which must be dual.
+  EarlyBoundResourceObject(ComBridge& bridge, IFirstOperationStringById* object, const IID& iid);
+
+  DispId IdOfOwnOperation(int position) override;
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+
+  // The id IdOfOwnOperation(1) hands out: it names the vtable call, not a
+  // dispatch member, and lies far from the ids type libraries assign.
+  static constexpr DispId kFirstOperation = 0x7EB00001;
+
+ private:
+  IFirstOperationStringById* object_;  // same object as dispatch(); no own reference
+  IID iid_;
+};
+
+}  // namespace kpx::win32

@@ -1,0 +1,74 @@
+// The outside world of the Windows build: the real registry, files, clock,
+// COM object creation and user interface.
+#pragma once
+
+#include "platform/win32/win32_api.h"
+
+#include "platform/platform.h"
+#include "platform/win32/com_bridge.h"
+
+namespace kpx::win32 {
+
+// The ANSI registry functions, as the add-in has always used them.
+class Win32Registry final : public platform::Registry {
+ public:
+  std::optional<platform::RegistryValue> QueryValue(platform::RootKey root, std::string_view key,
+                                                    std::string_view name) override;
+  bool SetValue(platform::RootKey root, std::string_view key, std::string_view name,
+                const platform::RegistryValue& value) override;
+  platform::KeyDisposition CreateKey(platform::RootKey root, std::string_view key) override;
+  std::string ToAnsi(std::string_view utf8) override;
+  std::string FromAnsi(std::string_view ansi) override;
+};
+
+class Win32FileSystem final : public platform::FileSystem {
+ public:
+  bool Exists(std::string_view path) override;
+  bool DeleteFile(std::string_view path) override;
+  bool AppendText(std::string_view path, std::string_view text) override;
+};
+
+class Win32Clock final : public platform::Clock {
+ public:
+  float Timer() override;
+  platform::DateTime Now() override;
+  void Sleep(uint32_t milliseconds) override;
+};
+
+// Objects come from COM; the ones that answer IDispatch are wrapped for the
+// core through the bridge.
+class Win32ObjectFactory final : public platform::ObjectFactory {
+ public:
+  explicit Win32ObjectFactory(ComBridge& bridge) : bridge_(bridge) {}
+  ObjectPtr CreateObject(std::string_view progId) override;
+  ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) override;
+
+ private:
+  ComBridge& bridge_;
+};
+
+class Win32UserInterface final : public platform::UserInterface {
+ public:
+  int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
+  bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
+  void DoEvents() override;
+};
+
+// All of it, handed to the core as one platform::Platform.
+class Win32Platform {
+ public:
+  explicit Win32Platform(ComBridge& bridge) : objects_(bridge) {}
+  Win32Platform(const Win32Platform&) = delete;
+  Win32Platform& operator=(const Win32Platform&) = delete;
+
+  platform::Platform platform() { return {registry_, files_, clock_, objects_, ui_}; }
+
+ private:
+  Win32Registry registry_;
+  Win32FileSystem files_;
+  Win32Clock clock_;
+  Win32ObjectFactory objects_;
+  Win32UserInterface ui_;
+};
+
+}  // namespace kpx::win32
