@@ -187,11 +187,6 @@ void CheckWritableName(std::string_view name, const char* what) {
 
 }  // namespace
 
-bool NoCaseLess::operator()(const std::string& a, const std::string& b) const {
-  return std::lexicographical_compare(a.begin(), a.end(), b.begin(), b.end(),
-                                      [](char x, char y) { return Lower(x) < Lower(y); });
-}
-
 std::string RootKeyName(platform::RootKey root) {
   switch (root) {
     case platform::RootKey::LocalMachine:

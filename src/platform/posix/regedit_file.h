@@ -5,6 +5,7 @@
 #include <string>
 #include <string_view>
 
+#include "automation/vb_strings.h"
 #include "platform/platform.h"
 
 namespace kpx::posix {
@@ -12,9 +13,6 @@ namespace kpx::posix {
 // Key paths are full ("HKEY_CURRENT_USER\Software\..."); keys compare
 // without regard to letter case, as Windows does. Value names too; "" is the
 // default value ("@" in the file).
-struct NoCaseLess {
-  bool operator()(const std::string& a, const std::string& b) const;
-};
 using RegeditValues = std::map<std::string, platform::RegistryValue, NoCaseLess>;
 using RegeditData = std::map<std::string, RegeditValues, NoCaseLess>;
 
