@@ -1,0 +1,168 @@
+#include "sim/companions.h"
+
+#include "automation/vb_strings.h"
+#include "shared/resource_strings.h"
+#include "shared/resource_texts.h"
+#include "sim/world.h"
+
+namespace kpx::sim {
+
+namespace {
+
+const char* KindName(CallKind kind) {
+  switch (kind) {
+    case CallKind::Method: return "method";
+    case CallKind::PropertyGet: return "get";
+    case CallKind::PropertyPut: return "put";
+    case CallKind::PropertyPutRef: return "putref";
+  }
+  return "?";
+}
+
+bool IsKeep(const InputJson& j) { return j.is_object() && j.size() == 1 && j.contains("keep"); }
+
+}  // namespace
+
+// ----------------------------------------------------------- CompanionObject
+
+CompanionObject::CompanionObject(World& world, std::shared_ptr<const CompanionSpec> spec, std::string label)
+    : world_(world), spec_(std::move(spec)), label_(std::move(label)) {
+  auto add = [&](const std::string& name) {
+    for (const std::string& n : names_)
+      if (EqualsNoCase(n, name)) return;
+    names_.push_back(name);
+  };
+  for (const std::string& op : spec_->operations) add(op);
+  for (const auto& [name, member] : spec_->members) add(name);
+}
+
+void CompanionObject::RecordFailure(EventJson call, const AutomationError& error) {
+  call["error"] = ErrorJson(error);
+  world_.log().Add(std::move(call));
+}
+
+DispId CompanionObject::IdOfName(std::string_view name) {
+  for (size_t i = 0; i < names_.size(); ++i)
+    if (EqualsNoCase(names_[i], name)) return static_cast<DispId>(i + 1);
+  const AutomationError error(vberr::kNoSuchMember);
+  RecordFailure({{"ev", "companion-call"}, {"instance", label_}, {"member", std::string(name)}}, error);
+  throw error;
+}
+
+DispId CompanionObject::IdOfOwnOperation(int position) {
+  if (position >= 1 && static_cast<size_t>(position) <= spec_->operations.size())
+    return IdOfName(spec_->operations[static_cast<size_t>(position - 1)]);
+  const AutomationError error(vberr::kNoSuchMember);
+  RecordFailure({{"ev", "companion-call"}, {"instance", label_}, {"operation", position}}, error);
+  throw error;
+}
+
+Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
+  if (dispId < 1 || static_cast<size_t>(dispId) > names_.size()) throw AutomationError(vberr::kNoSuchMember);
+  const std::string& name = names_[static_cast<size_t>(dispId - 1)];
+  EventLog& log = world_.log();
+
+  EventJson call{{"ev", "companion-call"}, {"instance", label_}, {"member", name}, {"kind", KindName(kind)}};
+  for (size_t i = 0; i < spec_->operations.size(); ++i)
+    if (EqualsNoCase(spec_->operations[i], name)) {
+      call["operation"] = i + 1;
+      break;
+    }
+  EventJson shown = EventJson::array();
+  for (const Variant& a : args)
+    shown.push_back(a.isByRef() ? EventJson{{"byref", log.Value(a)}} : log.Value(a));
+  call["args"] = std::move(shown);
+
+  const MemberSpec* member = spec_->FindMember(name);
+  if (!member) {
+    const AutomationError error(vberr::kNoSuchMember);
+    RecordFailure(std::move(call), error);
+    throw error;
+  }
+  if (member->raise) {
+    const AutomationError error(member->raise->number, member->raise->description);
+    RecordFailure(std::move(call), error);
+    throw error;
+  }
+  EventJson written = EventJson::object();
+  for (size_t i = 0; i < member->setArgs.size() && i < args.size(); ++i) {
+    if (!args[i].isByRef() || IsKeep(member->setArgs[i])) continue;  // a value argument cannot be written back
+    args[i].assign(world_.ToVariant(member->setArgs[i], this));
+    written[std::to_string(i + 1)] = log.Value(args[i]);
+  }
+  Variant result;
+  if (member->returnsObject) result = ReturnedObject(name, member->returnsObject);
+  else if (member->returns) result = world_.ToVariant(*member->returns, this);
+  call["result"] = log.Value(result);
+  if (!written.empty()) call["byref"] = std::move(written);
+  log.Add(std::move(call));
+  return result;
+}
+
+ObjectPtr CompanionObject::SubObject(const std::string& name) {
+  ObjectPtr& slot = objects_[name];
+  if (!slot) slot = std::make_shared<CompanionObject>(world_, spec_->objects.at(name), label_ + "." + name);
+  return slot;
+}
+
+ObjectPtr CompanionObject::ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionSpec>& spec) {
+  ObjectPtr& slot = objects_["()" + member];  // apart from the named objects
+  if (!slot) slot = std::make_shared<CompanionObject>(world_, spec, label_ + "." + member);
+  return slot;
+}
+
+// ------------------------------------------------------------ ResourceObject
+
+DispId ResourceObject::IdOfName(std::string_view name) {
+  if (EqualsNoCase(name, "GetString")) return 1;
+  throw AutomationError(vberr::kNoSuchMember);
+}
+
+DispId ResourceObject::IdOfOwnOperation(int position) {
+  if (position == 1) return 1;
+  throw AutomationError(vberr::kNoSuchMember);
+}
+
+Variant ResourceObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
+  if (dispId != 1 || (kind != CallKind::Method && kind != CallKind::PropertyGet))
+    throw AutomationError(vberr::kNoSuchMember);
+  if (args.size() != 1) throw AutomationError(vberr::kWrongArgCount);
+  return Text(args[0].toInt32());
+}
+
+std::string ResourceObject::Text(int32_t id) const {
+  if (auto it = overrides_.find(id); it != overrides_.end()) return it->second;
+  if (const char* text = FindResourceText(id)) return text;
+  throw AutomationError(vberr::kInvalidCall, "no string " + std::to_string(id));
+}
+
+// ---------------------------------------------------------- SimObjectFactory
+
+ObjectPtr SimObjectFactory::MakeResource() {
+  if (!world_.spec().resourceRegistered) throw AutomationError(vberr::kCantCreateObject);
+  const std::string base(kResourceProgId);
+  return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)),
+                                          world_.spec().resources);
+}
+
+ObjectPtr SimObjectFactory::MakeCompanion(const std::shared_ptr<const CompanionSpec>& spec) {
+  if (spec->createError) throw AutomationError(spec->createError->number, spec->createError->description);
+  const std::string base = spec->progid.empty() ? spec->clsid : spec->progid;
+  return std::make_shared<CompanionObject>(world_, spec, base + "#" + std::to_string(world_.NextInstance(base)));
+}
+
+ObjectPtr SimObjectFactory::CreateObject(std::string_view progId) {
+  if (EqualsNoCase(progId, kResourceProgId)) return MakeResource();
+  for (const auto& spec : world_.spec().companions)
+    if (!spec->progid.empty() && EqualsNoCase(spec->progid, progId)) return MakeCompanion(spec);
+  throw AutomationError(vberr::kCantCreateObject);
+}
+
+ObjectPtr SimObjectFactory::CreateInstance(std::string_view clsid, std::string_view) {
+  if (EqualsNoCase(clsid, kResourceClassId)) return MakeResource();
+  for (const auto& spec : world_.spec().companions)
+    if (!spec->clsid.empty() && EqualsNoCase(spec->clsid, clsid)) return MakeCompanion(spec);
+  throw AutomationError(vberr::kCantCreateObject);
+}
+
+}  // namespace kpx::sim

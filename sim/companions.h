@@ -1,0 +1,79 @@
+// Objects outside the host that the add-in creates: companion components as
+// the model file describes them, and the resource component. Neither counts
+// as a host call. Companion calls are recorded one by one; resource calls
+// are not (there are dozens per run and they say nothing new), only the
+// creation of resource objects is.
+#pragma once
+
+#include <map>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/platform.h"
+#include "sim/event_log.h"
+#include "sim/model_file.h"
+
+namespace kpx::sim {
+
+class World;
+
+// A scripted companion: its members answer, raise and write back arguments
+// as its spec says; a member the spec does not list raises 438.
+class CompanionObject final : public SimObject {
+ public:
+  CompanionObject(World& world, std::shared_ptr<const CompanionSpec> spec, std::string label);
+  std::string label() const override { return label_; }
+
+  DispId IdOfName(std::string_view name) override;
+  DispId IdOfOwnOperation(int position) override;
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+
+  // One of the spec's named objects, made on first use and kept.
+  ObjectPtr SubObject(const std::string& name);
+
+ private:
+  ObjectPtr ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionSpec>& spec);
+  void RecordFailure(EventJson call, const AutomationError& error);
+
+  World& world_;
+  std::shared_ptr<const CompanionSpec> spec_;
+  std::string label_;
+  std::vector<std::string> names_;  // DISPID = position + 1: own operations first
+  std::map<std::string, ObjectPtr> objects_;
+};
+
+// The resource component: texts by string id, from the model file's
+// overrides first, then from the add-in's own resource table.
+class ResourceObject final : public SimObject {
+ public:
+  ResourceObject(std::string label, const std::map<int32_t, std::string>& overrides)
+      : label_(std::move(label)), overrides_(overrides) {}
+  std::string label() const override { return label_; }
+
+  DispId IdOfName(std::string_view name) override;
+  DispId IdOfOwnOperation(int position) override;
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+
+  std::string Text(int32_t id) const;
+
+ private:
+  std::string label_;
+  const std::map<int32_t, std::string>& overrides_;
+};
+
+// Creates companions and resource objects by ProgID or class id, as the
+// model file lists them. Anything unknown fails with 429.
+class SimObjectFactory final : public platform::ObjectFactory {
+ public:
+  explicit SimObjectFactory(World& world) : world_(world) {}
+  ObjectPtr CreateObject(std::string_view progId) override;
+  ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) override;
+
+ private:
+  ObjectPtr MakeResource();
+  ObjectPtr MakeCompanion(const std::shared_ptr<const CompanionSpec>& spec);
+  World& world_;
+};
+
+}  // namespace kpx::sim

@@ -1,0 +1,598 @@
+#include "sim/host_objects.h"
+
+#include <map>
+
+#include "automation/vb_strings.h"
+#include "shared/host_ids.h"
+#include "sim/companions.h"
+#include "sim/world.h"
+
+namespace kpx::sim {
+
+namespace id = kpx::hostid;
+
+namespace {
+
+bool Reads(CallKind k) { return k == CallKind::Method || k == CallKind::PropertyGet; }
+bool Puts(CallKind k) { return k == CallKind::PropertyPut || k == CallKind::PropertyPutRef; }
+
+[[noreturn]] void NoMember() { throw AutomationError(vberr::kNoSuchMember); }
+
+// A read (method call or property get, which automation clients mix) taking
+// from `least` to `most` arguments.
+void Read(CallKind kind, std::span<Variant> args, size_t least, size_t most) {
+  if (!Reads(kind)) NoMember();
+  if (args.size() < least || args.size() > most) throw AutomationError(vberr::kWrongArgCount);
+}
+void Read(CallKind kind, std::span<Variant> args, size_t count = 0) { Read(kind, args, count, count); }
+
+// The value of a property put.
+Variant PutValue(CallKind kind, std::span<Variant> args) {
+  if (!Puts(kind)) NoMember();
+  if (args.size() != 1) throw AutomationError(vberr::kWrongArgCount);
+  return args[0].deref();
+}
+
+std::optional<std::string> LookUp(const Properties& p, std::string_view tool, std::string_view name) {
+  auto t = p.find(tool);
+  if (t == p.end()) return std::nullopt;
+  auto v = t->second.find(name);
+  if (v == t->second.end()) return std::nullopt;
+  return v->second;
+}
+
+}  // namespace
+
+// ---------------------------------------------------------------- HostObject
+
+DispId HostObject::IdOfName(std::string_view name) {
+  world_.log().CountHostCall();
+  for (const MemberName& m : Names())
+    if (EqualsNoCase(m.name, name)) return m.id;
+  NoMember();
+}
+
+Variant HostObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
+  world_.log().CountHostCall();
+  for (const MemberName& m : Names())
+    if (m.id == dispId) return Call(dispId, kind, args);
+  NoMember();
+}
+
+// -------------------------------------------------------------- FieldsObject
+
+FieldsObject::FieldsObject(World& world, std::string label, std::vector<Field> fields)
+    : HostObject(world), label_(std::move(label)), fields_(std::move(fields)) {
+  for (const Field& f : fields_) names_.push_back({f.name, f.id});
+}
+
+Variant FieldsObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  Read(kind, args);
+  for (const Field& f : fields_)
+    if (f.id == dispId) return f.value;
+  NoMember();
+}
+
+// ---------------------------------------------------------- CollectionObject
+
+CollectionObject::CollectionObject(World& world, std::string label, std::vector<ObjectPtr> items, bool editable)
+    : HostObject(world), label_(std::move(label)), items_(std::move(items)), editable_(editable) {}
+
+std::span<const MemberName> CollectionObject::Names() const {
+  static constexpr MemberName kEditable[] = {
+      {"Count", id::kCount}, {"GetAt", id::kGetAt}, {"Add", simid::kAdd}, {"RemoveAll", simid::kRemoveAll}};
+  return editable_ ? std::span<const MemberName>(kEditable) : std::span<const MemberName>(kEditable, 2);
+}
+
+Variant CollectionObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  switch (dispId) {
+    case id::kCount:
+      Read(kind, args);
+      if (items_.size() > 32767) throw AutomationError(vberr::kOverflow);
+      return static_cast<int16_t>(items_.size());
+    case id::kGetAt: {
+      Read(kind, args, 1);
+      const int16_t index = args[0].toInt16();
+      if (index < 1 || static_cast<size_t>(index) > items_.size()) throw AutomationError(vberr::kSubscript);
+      return items_[static_cast<size_t>(index - 1)];
+    }
+    case simid::kAdd:
+      Read(kind, args, 1);
+      items_.push_back(args[0].toObject());
+      return {};
+    case simid::kRemoveAll:
+      Read(kind, args);
+      items_.clear();
+      return {};
+    default:
+      NoMember();
+  }
+}
+
+// ----------------------------------------------------------- MenuEntryObject
+
+MenuEntryObject::MenuEntryObject(World& world, std::string label, std::string addin, std::string name, Variant state)
+    : HostObject(world), label_(std::move(label)), addin_(std::move(addin)), name_(std::move(name)),
+      state_(std::move(state)) {}
+
+std::span<const MemberName> MenuEntryObject::Names() const {
+  static constexpr MemberName kNames[] = {{id::kMenuState, simid::kMenuState}};
+  return kNames;
+}
+
+Variant MenuEntryObject::Call(DispId, CallKind kind, std::span<Variant> args) {
+  if (Reads(kind)) {
+    Read(kind, args);
+    return state_;
+  }
+  state_ = PutValue(kind, args);
+  world_.log().Add({{"ev", "menu-state"}, {"addin", addin_}, {"name", name_}, {"value", world_.log().Value(state_)}});
+  return {};
+}
+
+// --------------------------------------------------------------- AddInObject
+
+AddInObject::AddInObject(World& world, const AddInSpec& spec)
+    : HostObject(world), spec_(spec), settings_(spec.settings) {
+  if (spec.eventHandler)
+    eventHandler_ = std::make_shared<CompanionObject>(world, spec.eventHandler, label() + ".EventHandler");
+}
+
+std::span<const MemberName> AddInObject::Names() const {
+  // AddContextMenuItem last: a host without context menus lacks it.
+  static constexpr MemberName kNames[] = {
+      {"Name", id::kAddInName},
+      {"Deactivate", id::kDeactivate},
+      {"Activate", id::kActivate},
+      {"ReadSetting", id::kReadSetting},
+      {"WriteSetting", id::kWriteSetting},
+      {"HelpFile", id::kHelpFile},
+      {"InstallDirectory", id::kInstallDirectory},
+      {"RegistryRoot", id::kRegistryRoot},
+      {id::kEventHandler, simid::kEventHandler},
+      {"AddContextMenuItem", id::kAddContextMenuItem},
+  };
+  return std::span<const MemberName>(kNames, spec_.contextMenus ? std::size(kNames) : std::size(kNames) - 1);
+}
+
+Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  EventLog& log = world_.log();
+  switch (dispId) {
+    case id::kAddInName:
+      Read(kind, args);
+      return spec_.name;
+    case id::kActivate:
+    case id::kDeactivate:
+      Read(kind, args);
+      log.Add({{"ev", "addin"}, {"addin", spec_.id}, {"action", dispId == id::kActivate ? "Activate" : "Deactivate"}});
+      return {};
+    case id::kReadSetting: {
+      Read(kind, args, 2, 3);
+      const std::string section = args[0].toString(), entry = args[1].toString();
+      std::string value = args.size() > 2 ? args[2].toString() : std::string();
+      bool found = false;
+      if (auto s = settings_.find(section); s != settings_.end())
+        if (auto e = s->second.find(entry); e != s->second.end()) {
+          value = e->second;
+          found = true;
+        }
+      log.Add({{"ev", "setting-read"}, {"addin", spec_.id}, {"section", section}, {"entry", entry},
+               {"value", value}, {"found", found}});
+      return value;
+    }
+    case id::kWriteSetting: {
+      Read(kind, args, 3);
+      const std::string section = args[0].toString(), entry = args[1].toString(), value = args[2].toString();
+      settings_[section][entry] = value;
+      log.Add({{"ev", "setting-write"}, {"addin", spec_.id}, {"section", section}, {"entry", entry}, {"value", value}});
+      return true;
+    }
+    case id::kAddContextMenuItem: {
+      Read(kind, args, 3);
+      const int16_t itemType = args[0].toInt16();
+      const std::string caption = args[1].toString(), name = args[2].toString();
+      log.Add({{"ev", "menu-add"}, {"addin", spec_.id}, {"itemType", itemType}, {"caption", caption}, {"name", name}});
+      Variant state;
+      if (auto s = spec_.menuStates.find(name); s != spec_.menuStates.end()) state = world_.ToVariant(s->second);
+      return ObjectPtr(std::make_shared<MenuEntryObject>(world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)),
+                                                         spec_.id, name, state));
+    }
+    case id::kHelpFile:
+      Read(kind, args);
+      return spec_.helpFile;
+    case id::kInstallDirectory:
+      Read(kind, args);
+      return spec_.installDirectory;
+    case id::kRegistryRoot:
+      Read(kind, args);
+      return spec_.registryRoot;
+    case simid::kEventHandler:
+      Read(kind, args);
+      return eventHandler_;
+    default:
+      NoMember();
+  }
+}
+
+// -------------------------------------------------------- AddInManagerObject
+
+std::span<const MemberName> AddInManagerObject::Names() const {
+  static constexpr MemberName kNames[] = {{"AddIns", id::kAddIns}};
+  return kNames;
+}
+
+Variant AddInManagerObject::Call(DispId, CallKind kind, std::span<Variant> args) {
+  Read(kind, args);
+  return addins_;
+}
+
+// --------------------------------------------------------- ApplicationObject
+
+ApplicationObject::ApplicationObject(World& world, const ApplicationSpec& spec, ObjectPtr manager)
+    : HostObject(world), spec_(spec), manager_(std::move(manager)),
+      window_{spec.top, spec.left, spec.height, spec.width} {}
+
+std::span<const MemberName> ApplicationObject::Names() const {
+  static constexpr MemberName kNames[] = {
+      {"CurrentModel", id::kCurrentModel}, {"WriteErrorLog", id::kWriteErrorLog},
+      {"ApplicationPath", id::kApplicationPath}, {"ExecuteScript", id::kExecuteScript},
+      {"AddInManager", id::kAddInManager},  {"Top", id::kWindowTop},
+      {"Left", id::kWindowLeft},            {"Height", id::kWindowHeight},
+      {"Width", id::kWindowWidth},          {id::kGetMainWnd, simid::kGetMainWnd},
+  };
+  return kNames;
+}
+
+Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  EventLog& log = world_.log();
+  switch (dispId) {
+    case id::kCurrentModel:
+      Read(kind, args);
+      return world_.model();
+    case id::kWriteErrorLog: {
+      Read(kind, args, 1);
+      log.Add({{"ev", "hostlog"}, {"text", args[0].toString()}});
+      return {};
+    }
+    case id::kApplicationPath:
+      Read(kind, args);
+      return spec_.path;
+    case id::kExecuteScript: {
+      Read(kind, args, 1);
+      const std::string path = args[0].toString();
+      EventJson ev{{"ev", "script"}, {"path", path}};
+      auto failing = spec_.failingScripts.find(path);
+      if (failing == spec_.failingScripts.end()) {
+        log.Add(std::move(ev));
+        return {};
+      }
+      const AutomationError error(failing->second.number, failing->second.description);
+      ev["error"] = ErrorJson(error);
+      log.Add(std::move(ev));
+      throw error;
+    }
+    case id::kAddInManager:
+      Read(kind, args);
+      return manager_;
+    case id::kWindowTop:
+    case id::kWindowLeft:
+    case id::kWindowHeight:
+    case id::kWindowWidth: {
+      int16_t& slot = window_[dispId - id::kWindowTop];
+      if (Reads(kind)) {
+        Read(kind, args);
+        return slot;
+      }
+      slot = PutValue(kind, args).toInt16();
+      static constexpr const char* kNames[] = {"Top", "Left", "Height", "Width"};
+      log.Add({{"ev", "element-write"}, {"element", "$app"}, {"member", kNames[dispId - id::kWindowTop]},
+               {"value", log.Value(Variant(slot))}});
+      return {};
+    }
+    case simid::kGetMainWnd:
+      Read(kind, args);
+      return spec_.mainWindow;
+    default:
+      NoMember();
+  }
+}
+
+// --------------------------------------------------------------- ModelObject
+
+std::span<const MemberName> ModelObject::Names() const {
+  static constexpr MemberName kNames[] = {{"GetSelectedItems", id::kGetSelectedItems},
+                                          {"GetPropertyValue", id::kGetPropertyValue}};
+  return kNames;
+}
+
+Variant ModelObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  if (dispId == id::kGetSelectedItems) {
+    Read(kind, args);
+    return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:selection", world_.SelectedItems(), true));
+  }
+  Read(kind, args, 2);
+  return LookUp(world_.spec().modelProperties, args[0].toString(), args[1].toString()).value_or("");
+}
+
+// ------------------------------------------------------------- ElementObject
+
+namespace {
+
+using NameTable = std::vector<MemberName>;
+
+const NameTable& NamesFor(const std::string& kind) {
+  static const std::map<std::string, NameTable> kTables = [] {
+    const NameTable common = {
+        {"Name", id::kName},
+        {"Stereotype", id::kStereotype},
+        {"IdentifyClass", id::kIdentifyClass},
+        {"IsKindOf", id::kIsKindOf},
+        {"GetPropertyValue", id::kGetPropertyValue},
+        {"FindProperty", id::kFindProperty},
+        {"CreateProperty", id::kCreateProperty},
+        {"OverrideProperty", id::kOverrideProperty},
+    };
+    const NameTable relation = {
+        {"HasClient", id::kHasClient},   {"HasSupplier", id::kHasSupplier},   {"GetClient", id::kGetClient},
+        {"GetSupplier", id::kGetSupplier}, {"RelationText", id::kRelationText},
+    };
+    auto with = [](NameTable base, std::initializer_list<NameTable> more) {
+      for (const NameTable& m : more) base.insert(base.end(), m.begin(), m.end());
+      return base;
+    };
+    std::map<std::string, NameTable> t;
+    t["Class"] = with(common, {{
+                                  {"DisplayName", id::kDisplayName},
+                                  {"GetInheritRelations", id::kGetInheritRelations},
+                                  {"DeleteInheritRel", id::kDeleteInheritRel},
+                                  {"GetAssignedComponents", id::kGetAssignedComponents},
+                                  {"IsNested", id::kIsNested},
+                                  {"EnclosingClass", id::kEnclosingClass},
+                                  {id::kClassKind, simid::kClassKind},
+                                  {"GetClassKind", id::kGetClassKind},
+                                  {"GetAssignedLanguage", simid::kGetAssignedLanguage},
+                                  {"GetRelatedClasses", simid::kGetRelatedClasses},
+                              }});
+    t["Module"] = with(common, {{{"Language", id::kModuleLanguage}}});
+    t["Attribute"] = with(common, {{{"ParentClass", id::kAttributeParentClass}}});
+    t["Operation"] = with(common, {{{"ParentClass", id::kOperationParentClass}}});
+    t["InheritRelation"] = with(common, {relation, {{"GetSupplierClass", id::kGetSupplierClass}}});
+    t["RealizeRelation"] = with(common, {relation});
+    t["HasRelation"] = with(common, {relation});
+    t["DependencyRelation"] = with(common, {relation});
+    t["ModuleVisibilityRelationship"] = with(common, {relation, {{"Unit", id::kModuleDependencyUnit}}});
+    t["Association"] = with(common, {{
+                                        {"GetOtherRole", id::kGetOtherRole},
+                                        {"Role1", simid::kRole1},
+                                        {"Role2", simid::kRole2},
+                                    }});
+    t["Role"] = with(common, {{
+                                 {"GetClient", id::kGetClient},
+                                 {"GetSupplier", id::kGetSupplier},
+                                 {"GetRoleClass", id::kGetRoleClass},
+                                 {"Navigable", id::kNavigable},
+                                 {"Association", simid::kAssociation},
+                             }});
+    return t;
+  }();
+  return kTables.at(kind);
+}
+
+// The relation kind GetRelatedClasses(0, n) follows.
+std::string_view RelatedKind(int32_t n) {
+  switch (n) {
+    case 5: return "DependencyRelation";
+    case 6: return "RealizeRelation";
+    default: return {};
+  }
+}
+
+}  // namespace
+
+ElementObject::ElementObject(World& world, const ElementSpec& spec)
+    : HostObject(world), spec_(spec), name_(spec.name), stereotype_(spec.stereotype), properties_(spec.properties) {}
+
+std::span<const MemberName> ElementObject::Names() const { return NamesFor(spec_.kind); }
+
+ObjectPtr ElementObject::Ref(const std::string& key) const {
+  if (key.empty()) return nullptr;
+  return world_.FindElement(key);
+}
+
+std::string ElementObject::RoleClassOf(const std::string& roleKey) const {
+  auto role = world_.FindElement(roleKey);
+  return role ? role->spec().roleClass : std::string();
+}
+
+void ElementObject::RecordWrite(std::string_view member, EventJson fields) {
+  fields["ev"] = "element-write";
+  fields["element"] = spec_.key;
+  fields["member"] = member;
+  world_.log().Add(std::move(fields));
+}
+
+Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  EventLog& log = world_.log();
+  const std::string& key = spec_.key;
+  switch (dispId) {
+    // ---- every element
+    case id::kName:
+    case id::kStereotype: {
+      std::string& field = dispId == id::kName ? name_ : stereotype_;
+      if (Reads(kind)) {
+        Read(kind, args);
+        return field;
+      }
+      field = PutValue(kind, args).toString();
+      RecordWrite(dispId == id::kName ? "Name" : "Stereotype", {{"value", field}});
+      return {};
+    }
+    case id::kIdentifyClass:
+      Read(kind, args);
+      return spec_.kind;
+    case id::kIsKindOf:
+      Read(kind, args, 1);
+      return EqualsNoCase(spec_.kind, args[0].toString());
+    case id::kGetPropertyValue:
+      Read(kind, args, 2);
+      return LookUp(properties_, args[0].toString(), args[1].toString()).value_or("");
+    case id::kFindProperty: {
+      Read(kind, args, 2);
+      const std::string tool = args[0].toString(), name = args[1].toString();
+      std::optional<std::string> value = LookUp(properties_, tool, name);
+      if (!value) return Variant::Nothing();
+      return ObjectPtr(std::make_shared<FieldsObject>(
+          world_, "property:" + key + "/" + tool + "/" + name,
+          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(name)},
+                                           {"Value", simid::kValue, Variant(*value)},
+                                           {"ToolName", simid::kToolName, Variant(tool)}}));
+    }
+    case id::kCreateProperty: {
+      Read(kind, args, 3, 4);
+      const std::string tool = args[0].toString(), name = args[1].toString(), value = args[2].toString();
+      const bool created = !LookUp(properties_, tool, name);
+      if (created) properties_[tool][name] = value;
+      RecordWrite("CreateProperty", {{"tool", tool},
+                                     {"property", name},
+                                     {"value", value},
+                                     {"type", args.size() > 3 ? log.Value(args[3]) : EventJson()},
+                                     {"created", created}});
+      return created;
+    }
+    case id::kOverrideProperty: {
+      Read(kind, args, 3);
+      const std::string tool = args[0].toString(), name = args[1].toString(), value = args[2].toString();
+      properties_[tool][name] = value;
+      RecordWrite("OverrideProperty", {{"tool", tool}, {"property", name}, {"value", value}});
+      return true;
+    }
+
+    // ---- class
+    case id::kDisplayName:
+      Read(kind, args);
+      return spec_.displayName;
+    case id::kGetInheritRelations: {
+      Read(kind, args);
+      std::vector<ObjectPtr> items;
+      for (const auto& e : world_.elements())
+        if (e->kind() == "InheritRelation" && !e->removed() && e->spec().client == key) items.push_back(e);
+      return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".inherits", items, true));
+    }
+    case id::kDeleteInheritRel: {
+      Read(kind, args, 1);
+      auto* relation = dynamic_cast<ElementObject*>(args[0].toObject().get());
+      if (!relation || relation->kind() != "InheritRelation" || relation->removed() ||
+          relation->spec().client != key)
+        throw AutomationError(vberr::kInvalidCall, "not an inherit relation of " + key);
+      relation->removed_ = true;
+      RecordWrite("DeleteInheritRel", {{"value", log.Value(args[0])}});
+      return {};
+    }
+    case id::kGetAssignedComponents: {
+      Read(kind, args);
+      std::vector<ObjectPtr> items;
+      for (const std::string& c : spec_.components) items.push_back(Ref(c));
+      return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".components", items, true));
+    }
+    case id::kIsNested:
+      Read(kind, args);
+      return !spec_.nestedIn.empty();
+    case id::kEnclosingClass:
+      Read(kind, args);
+      return Ref(spec_.nestedIn);
+    case simid::kClassKind:
+      Read(kind, args);
+      return ObjectPtr(std::make_shared<FieldsObject>(
+          world_, "classkind:" + key,
+          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(spec_.classKind)}}));
+    case id::kGetClassKind:
+      Read(kind, args);
+      return ObjectPtr(std::make_shared<FieldsObject>(
+          world_, "package:" + spec_.package,
+          std::vector<FieldsObject::Field>{{"KindTest", id::kKindTest, Variant(spec_.packageEditable)},
+                                           {"Name", id::kName, Variant(spec_.package)}}));
+    case simid::kGetAssignedLanguage:
+      Read(kind, args);
+      return spec_.language;
+    case simid::kGetRelatedClasses: {
+      Read(kind, args, 2);
+      const std::string_view relationKind = RelatedKind(args[1].toInt32());
+      std::vector<ObjectPtr> items;
+      for (const auto& e : world_.elements())
+        if (!relationKind.empty() && e->kind() == relationKind && !e->removed() && e->spec().supplier == key)
+          if (auto client = world_.FindElement(e->spec().client); client && client->kind() == "Class")
+            items.push_back(client);
+      return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".related", items, true));
+    }
+
+    // ---- attribute, operation
+    case id::kAttributeParentClass:
+    case id::kOperationParentClass:
+      Read(kind, args);
+      return Ref(spec_.owner);
+
+    // ---- module
+    case id::kModuleLanguage:
+      Read(kind, args);
+      return spec_.language;
+
+    // ---- relations; on a role, both ends name the role's class
+    case id::kHasClient:
+      Read(kind, args);
+      return !spec_.client.empty();
+    case id::kHasSupplier:
+      Read(kind, args);
+      return !spec_.supplier.empty();
+    case id::kGetClient:
+    case id::kGetSupplier:
+      Read(kind, args);
+      if (spec_.kind == "Role") return Ref(spec_.roleClass);
+      return Ref(dispId == id::kGetClient ? spec_.client : spec_.supplier);
+    case id::kGetSupplierClass: {
+      Read(kind, args);
+      auto supplier = world_.FindElement(spec_.supplier);
+      return supplier && supplier->kind() == "Class" ? ObjectPtr(supplier) : ObjectPtr();
+    }
+    case id::kRelationText:
+      Read(kind, args);
+      return spec_.relationText;
+    case id::kModuleDependencyUnit:
+      Read(kind, args);
+      return ObjectPtr(std::make_shared<FieldsObject>(
+          world_, "unit:" + key,
+          std::vector<FieldsObject::Field>{{"IsModifiable", id::kKindTest, Variant(spec_.unitModifiable)}}));
+
+    // ---- association
+    case id::kGetOtherRole: {
+      Read(kind, args, 1);
+      auto* cls = dynamic_cast<ElementObject*>(args[0].toObject().get());
+      const std::string at = cls ? cls->spec().key : std::string();
+      if (!at.empty() && RoleClassOf(spec_.role1) == at) return Ref(spec_.role2);
+      if (!at.empty() && RoleClassOf(spec_.role2) == at) return Ref(spec_.role1);
+      throw AutomationError(vberr::kInvalidCall, "the class is at neither end of " + key);
+    }
+    case simid::kRole1:
+      Read(kind, args);
+      return Ref(spec_.role1);
+    case simid::kRole2:
+      Read(kind, args);
+      return Ref(spec_.role2);
+
+    // ---- role
+    case id::kGetRoleClass:
+      Read(kind, args);
+      return Ref(spec_.roleClass);
+    case id::kNavigable:
+      Read(kind, args);
+      return spec_.navigable;
+    case simid::kAssociation:
+      Read(kind, args);
+      for (const auto& e : world_.elements())
+        if (e->kind() == "Association" && (e->spec().role1 == key || e->spec().role2 == key)) return ObjectPtr(e);
+      return Variant::Nothing();
+    default:
+      NoMember();
+  }
+}
+
+}  // namespace kpx::sim

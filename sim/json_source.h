@@ -1,0 +1,119 @@
+// The simulator's input files are JSON written by hand. Every fault in them
+// must name its line, so each file is kept with an index from JSON pointers
+// to the lines where values and object keys start.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <initializer_list>
+#include <map>
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include <nlohmann/json.hpp>
+
+namespace kpx::sim {
+
+// Input files keep their members in file order.
+using InputJson = nlohmann::ordered_json;
+
+// A fault in a model or scenario file. what() is "FILE:LINE: message".
+class InputError : public std::runtime_error {
+ public:
+  InputError(std::string file, int line, std::string message);
+  const std::string& file() const { return file_; }
+  int line() const { return line_; }
+  const std::string& message() const { return message_; }
+
+ private:
+  std::string file_;
+  int line_;
+  std::string message_;
+};
+
+// One parsed JSON file and where each of its values starts.
+class JsonSource {
+ public:
+  // Parses `text`; a syntax error, a duplicate key or a top level that is
+  // not an object raises InputError at its line. `name` is how errors name
+  // the file.
+  JsonSource(std::string name, std::string text);
+  // Reads and parses a file; an unreadable file is an InputError at line 0.
+  static JsonSource Load(const std::filesystem::path& file);
+
+  const std::string& name() const { return name_; }
+  const InputJson& root() const { return root_; }
+  // The line of the value at `pointer` ("" is the whole document); 0 when unknown.
+  int LineOf(const std::string& pointer) const;
+  // The line of the key that names the member at `pointer`; its value's line
+  // for array elements and the root.
+  int KeyLineOf(const std::string& pointer) const;
+
+ private:
+  void Index();
+  std::string name_;
+  std::string text_;
+  InputJson root_;
+  std::map<std::string, int> valueLines_;
+  std::map<std::string, int> keyLines_;
+};
+
+// Appends one reference token to a JSON pointer, escaped.
+std::string PointerAppend(const std::string& pointer, std::string_view token);
+
+// A value inside a JsonSource, for reading it with checks that name the
+// right line when they fail.
+class Node {
+ public:
+  Node(const JsonSource& source, const InputJson& value, std::string pointer)
+      : source_(&source), value_(&value), pointer_(std::move(pointer)) {}
+  static Node Root(const JsonSource& source) { return Node(source, source.root(), ""); }
+
+  const InputJson& json() const { return *value_; }
+  const std::string& pointer() const { return pointer_; }
+  const JsonSource& source() const { return *source_; }
+  int line() const { return source_->LineOf(pointer_); }
+
+  [[noreturn]] void Fail(const std::string& message) const;
+  // A fault of the member `key` itself (an unknown or misplaced key).
+  [[noreturn]] void FailKey(std::string_view key, const std::string& message) const;
+
+  bool IsObject() const { return value_->is_object(); }
+  bool IsArray() const { return value_->is_array(); }
+  bool IsString() const { return value_->is_string(); }
+  bool IsNull() const { return value_->is_null(); }
+
+  void ExpectObject(std::string_view what = "an object") const;
+  void ExpectArray(std::string_view what = "a list") const;
+  // Every key must be one of `allowed`: unknown keys are typos.
+  void ExpectKeys(std::initializer_list<std::string_view> allowed) const;
+  void ExpectKeys(const std::vector<std::string_view>& allowed) const;
+
+  // The member `key` of an object (which must be one); Fail when missing.
+  Node Member(std::string_view key) const;
+  std::optional<Node> Find(std::string_view key) const;
+  // Members in file order, and elements of a list.
+  std::vector<std::pair<std::string, Node>> Members() const;
+  std::vector<Node> Elements() const;
+
+  std::string String() const;
+  bool Bool() const;
+  double Number() const;
+  int64_t Integer() const;
+  int32_t Int32() const;
+
+  // Reads an optional member with a default.
+  std::string StringOr(std::string_view key, std::string fallback) const;
+  bool BoolOr(std::string_view key, bool fallback) const;
+
+ private:
+  const JsonSource* source_;
+  const InputJson* value_;
+  std::string pointer_;
+};
+
+}  // namespace kpx::sim

@@ -1,0 +1,566 @@
+#include "sim/model_file.h"
+
+#include <algorithm>
+#include <cctype>
+#include <limits>
+
+#include "automation/automation_error.h"
+#include "automation/vb_strings.h"
+
+namespace kpx::sim {
+
+bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
+  return std::lexicographical_compare(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) {
+    return std::tolower(static_cast<unsigned char>(x)) < std::tolower(static_cast<unsigned char>(y));
+  });
+}
+
+const MemberSpec* CompanionSpec::FindMember(std::string_view name) const {
+  auto it = members.find(name);
+  return it == members.end() ? nullptr : &it->second;
+}
+
+const ElementSpec* ModelSpec::FindElement(std::string_view key) const {
+  for (const ElementSpec& e : elements)
+    if (e.key == key) return &e;
+  return nullptr;
+}
+
+const AddInSpec* ModelSpec::FindAddIn(std::string_view id) const {
+  for (const AddInSpec& a : addins)
+    if (a.id == id) return &a;
+  return nullptr;
+}
+
+const std::vector<std::string_view>& ElementKinds() {
+  static const std::vector<std::string_view> kKinds = {
+      "Class",           "Module",          "Attribute",  "Operation",          "Role",
+      "Association",     "InheritRelation", "RealizeRelation", "HasRelation", "DependencyRelation",
+      "ModuleVisibilityRelationship"};
+  return kKinds;
+}
+
+bool IsRelationKind(std::string_view kind) {
+  return kind == "InheritRelation" || kind == "RealizeRelation" || kind == "HasRelation" ||
+         kind == "DependencyRelation" || kind == "ModuleVisibilityRelationship";
+}
+
+// ------------------------------------------------------------ small pieces
+
+ErrorSpec ParseError(const Node& node) {
+  node.ExpectKeys({"number", "description"});
+  ErrorSpec e;
+  e.number = node.Member("number").Int32();
+  if (e.number == 0) node.Member("number").Fail("an error number must not be 0");
+  e.description = node.StringOr("description", VbErrorDescription(e.number));
+  return e;
+}
+
+namespace {
+
+std::optional<platform::RootKey> RootOf(std::string_view name) {
+  if (EqualsNoCase(name, "HKEY_LOCAL_MACHINE") || EqualsNoCase(name, "HKLM")) return platform::RootKey::LocalMachine;
+  if (EqualsNoCase(name, "HKEY_CURRENT_USER") || EqualsNoCase(name, "HKCU")) return platform::RootKey::CurrentUser;
+  return std::nullopt;
+}
+
+std::string DwordBytes(uint32_t u) {
+  std::string data;
+  for (int i = 0; i < 4; ++i) data.push_back(static_cast<char>((u >> (8 * i)) & 0xFF));
+  return data;
+}
+
+uint32_t DwordOf(const Node& n) {
+  if (n.IsString()) {
+    const std::string s = n.String();
+    std::string digits = s;
+    int base = 10;
+    if (digits.size() > 2 && digits[0] == '0' && (digits[1] == 'x' || digits[1] == 'X')) {
+      digits = digits.substr(2);
+      base = 16;
+    }
+    if (digits.empty() || !std::all_of(digits.begin(), digits.end(), [&](char c) {
+          return base == 16 ? std::isxdigit(static_cast<unsigned char>(c)) != 0
+                            : std::isdigit(static_cast<unsigned char>(c)) != 0;
+        }))
+      n.Fail("\"" + s + "\" is not a 32-bit number (write 4278190208 or \"0xff000080\")");
+    const unsigned long long v = std::stoull(digits.substr(0, 17), nullptr, base);
+    if (digits.size() > 16 || v > 0xFFFFFFFFull) n.Fail("\"" + s + "\" does not fit in 32 bits");
+    return static_cast<uint32_t>(v);
+  }
+  const int64_t v = n.Integer();
+  if (v < std::numeric_limits<int32_t>::min() || v > 0xFFFFFFFFll) n.Fail("number does not fit in 32 bits");
+  return static_cast<uint32_t>(v);
+}
+
+std::string HexBytes(const Node& n) {
+  const std::string hex = n.String();
+  std::string data;
+  if (hex.size() % 2 != 0) n.Fail("binary data needs two hex digits per byte");
+  for (size_t i = 0; i < hex.size(); i += 2) {
+    if (!std::isxdigit(static_cast<unsigned char>(hex[i])) || !std::isxdigit(static_cast<unsigned char>(hex[i + 1])))
+      n.Fail("\"" + hex + "\" is not hex data");
+    data.push_back(static_cast<char>(std::stoi(hex.substr(i, 2), nullptr, 16)));
+  }
+  return data;
+}
+
+platform::RegistryValue RegistryValueOf(const Node& n) {
+  if (n.IsString()) return {platform::kRegSz, n.String() + '\0'};
+  if (n.json().is_number()) return {platform::kRegDword, DwordBytes(DwordOf(n))};
+  if (!n.IsObject() || n.json().size() != 1)
+    n.Fail("a registry value is a string, a number, or one of {\"sz\": ...}, {\"dword\": ...}, {\"binary\": ...}");
+  n.ExpectKeys({"sz", "dword", "binary"});
+  if (auto sz = n.Find("sz")) return {platform::kRegSz, sz->String() + '\0'};
+  if (auto dw = n.Find("dword")) return {platform::kRegDword, DwordBytes(DwordOf(*dw))};
+  return {platform::kRegBinary, HexBytes(n.Member("binary"))};
+}
+
+int ParseNumberPart(const Node& n, const std::string& text, size_t pos, size_t len, int lo, int hi) {
+  if (pos + len > text.size()) n.Fail("malformed \"" + text + "\"");
+  int v = 0;
+  for (size_t i = pos; i < pos + len; ++i) {
+    if (!std::isdigit(static_cast<unsigned char>(text[i]))) n.Fail("malformed \"" + text + "\"");
+    v = v * 10 + (text[i] - '0');
+  }
+  if (v < lo || v > hi) n.Fail("\"" + text + "\" is out of range");
+  return v;
+}
+
+int DaysInMonth(int year, int month) {
+  static constexpr int kDays[] = {31, 28, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
+  const bool leap = (year % 4 == 0 && year % 100 != 0) || year % 400 == 0;
+  return month == 2 && leap ? 29 : kDays[month - 1];
+}
+
+}  // namespace
+
+std::vector<RegistryEntry> ParseRegistry(const Node& node) {
+  std::vector<RegistryEntry> out;
+  for (const auto& [fullKey, values] : node.Members()) {
+    const size_t slash = fullKey.find('\\');
+    std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
+    if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
+      node.FailKey(fullKey, "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+    values.ExpectObject("an object of values");
+    RegistryEntry keyOnly;
+    keyOnly.root = *root;
+    keyOnly.key = fullKey.substr(slash + 1);
+    out.push_back(keyOnly);
+    for (const auto& [name, value] : values.Members()) {
+      RegistryEntry e = keyOnly;
+      e.name = name == "@" ? "" : name;
+      e.value = RegistryValueOf(value);
+      out.push_back(std::move(e));
+    }
+  }
+  return out;
+}
+
+ClockSetting ParseClock(const Node& node) {
+  node.ExpectKeys({"date", "time", "step"});
+  ClockSetting c;
+  if (auto d = node.Find("date")) {
+    const std::string s = d->String();
+    if (s.size() != 10 || s[4] != '-' || s[7] != '-') d->Fail("a date is written YYYY-MM-DD");
+    platform::DateTime t;
+    t.year = ParseNumberPart(*d, s, 0, 4, 100, 9999);
+    t.month = ParseNumberPart(*d, s, 5, 2, 1, 12);
+    t.day = ParseNumberPart(*d, s, 8, 2, 1, DaysInMonth(t.year, t.month));
+    c.date = t;
+  }
+  if (auto tm = node.Find("time")) {
+    const std::string s = tm->String();
+    if (s.size() < 8 || s[2] != ':' || s[5] != ':') tm->Fail("a time is written HH:MM:SS or HH:MM:SS.fff");
+    double seconds = ParseNumberPart(*tm, s, 0, 2, 0, 23) * 3600.0 + ParseNumberPart(*tm, s, 3, 2, 0, 59) * 60.0 +
+                     ParseNumberPart(*tm, s, 6, 2, 0, 59);
+    if (s.size() > 8) {
+      if (s[8] != '.' || s.size() == 9) tm->Fail("a time is written HH:MM:SS or HH:MM:SS.fff");
+      double scale = 0.1;
+      for (size_t i = 9; i < s.size(); ++i, scale /= 10) {
+        if (!std::isdigit(static_cast<unsigned char>(s[i]))) tm->Fail("malformed \"" + s + "\"");
+        seconds += (s[i] - '0') * scale;
+      }
+    }
+    c.seconds = seconds;
+  }
+  if (auto st = node.Find("step")) {
+    c.step = st->Number();
+    if (*c.step < 0) st->Fail("the clock cannot step backwards");
+  }
+  return c;
+}
+
+// ------------------------------------------------------------------ values
+
+void CheckValue(const Node& n, const ModelSpec& model, const CompanionSpec* owner, bool byRef) {
+  const InputJson& j = n.json();
+  if (j.is_null() || j.is_boolean() || j.is_string() || j.is_number_float()) return;
+  if (j.is_number()) {
+    n.Int32();  // a bare whole number is a Long
+    return;
+  }
+  if (j.is_array()) n.Fail("a list is not a value (an argument or a result is one value)");
+  if (j.size() != 1) n.Fail("a typed value is an object with exactly one key, such as {\"i2\": 4}");
+  const std::string form = j.begin().key();
+  const Node inner = n.Member(form);
+  if (form == "string") inner.String();
+  else if (form == "i2") {
+    int64_t v = inner.Integer();
+    if (v < -32768 || v > 32767) inner.Fail("number out of the 16-bit range");
+  } else if (form == "i4") inner.Int32();
+  else if (form == "r4" || form == "r8" || form == "date") inner.Number();
+  else if (form == "bool") inner.Bool();
+  else if (form == "null" || form == "nothing") {
+    if (!inner.Bool()) inner.Fail("write {\"" + form + "\": true}");
+  } else if (form == "element") {
+    if (!model.FindElement(inner.String())) inner.Fail("no element \"" + inner.String() + "\" in the model");
+  } else if (form == "addin") {
+    if (!model.FindAddIn(inner.String())) inner.Fail("no add-in \"" + inner.String() + "\" in the model");
+  } else if (form == "object" && owner) {
+    if (!owner->objects.count(inner.String())) inner.Fail("the companion has no object \"" + inner.String() + "\"");
+  } else if (form == "byref" && byRef) {
+    CheckValue(inner, model, owner, false);
+  } else {
+    std::string forms = "string, i2, i4, r4, r8, date, bool, null, nothing, element, addin";
+    if (owner) forms += ", object";
+    if (byRef) forms += ", byref";
+    n.FailKey(form, "unknown value form \"" + form + "\" (expected one of: " + forms + ")");
+  }
+}
+
+// ------------------------------------------------------------------- model
+
+namespace {
+
+class ModelReader {
+ public:
+  explicit ModelReader(const JsonSource& source) : root_(Node::Root(source)) {}
+
+  ModelSpec Read() {
+    root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
+                      "resources", "resourceComponent", "model"});
+    if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
+    if (auto n = root_.Find("files")) ReadFiles(*n);
+    if (auto n = root_.Find("folders"))
+      for (const Node& f : n->Elements()) m_.folders.push_back(Path(f));
+    if (auto n = root_.Find("clock")) m_.clock = ParseClock(*n);
+    if (auto n = root_.Find("application")) ReadApplication(*n);
+    if (auto n = root_.Find("resources")) ReadResources(*n);
+    if (auto n = root_.Find("resourceComponent")) {
+      n->ExpectKeys({"registered"});
+      m_.resourceRegistered = n->BoolOr("registered", true);
+    }
+    // Names first: add-ins, companions and the selection refer to elements
+    // and add-ins wherever they stand in the file.
+    if (auto n = root_.Find("model")) ReadModel(*n);
+    if (auto n = root_.Find("addins")) ReadAddIns(*n);
+    if (auto n = root_.Find("companions"))
+      for (const Node& c : n->Elements()) m_.companions.push_back(ReadCompanion(c, true));
+    return std::move(m_);
+  }
+
+ private:
+  static std::string Path(const Node& n) {
+    std::string p = n.String();
+    if (p.empty()) n.Fail("empty path");
+    return p;
+  }
+
+  void ReadFiles(const Node& n) {
+    for (const auto& [path, content] : n.Members()) {
+      if (path.empty()) n.FailKey(path, "empty path");
+      m_.files.emplace_back(path, content.String());
+    }
+  }
+
+  void ReadApplication(const Node& n) {
+    n.ExpectKeys({"path", "mainWindow", "window", "failingScripts"});
+    ApplicationSpec& a = m_.application;
+    a.path = n.StringOr("path", a.path);
+    if (auto w = n.Find("mainWindow")) a.mainWindow = w->Int32();
+    if (auto w = n.Find("window")) {
+      w->ExpectKeys({"top", "left", "height", "width"});
+      auto get16 = [&](std::string_view key, int16_t& out) {
+        if (auto v = w->Find(key)) {
+          int64_t x = v->Integer();
+          if (x < -32768 || x > 32767) v->Fail("number out of the 16-bit range");
+          out = static_cast<int16_t>(x);
+        }
+      };
+      get16("top", a.top);
+      get16("left", a.left);
+      get16("height", a.height);
+      get16("width", a.width);
+    }
+    if (auto s = n.Find("failingScripts"))
+      for (const auto& [path, error] : s->Members()) a.failingScripts[path] = ParseError(error);
+  }
+
+  void ReadResources(const Node& n) {
+    for (const auto& [id, text] : n.Members()) {
+      size_t used = 0;
+      long v = 0;
+      try {
+        v = std::stol(id, &used);
+      } catch (...) {
+        used = 0;
+      }
+      if (used == 0 || used != id.size() || v < std::numeric_limits<int32_t>::min() ||
+          v > std::numeric_limits<int32_t>::max())
+        n.FailKey(id, "a resource is keyed by its string id, such as \"5030\"");
+      m_.resources[static_cast<int32_t>(v)] = text.String();
+    }
+  }
+
+  static Properties ReadProperties(const Node& n) {
+    Properties p;
+    for (const auto& [tool, props] : n.Members()) {
+      props.ExpectObject("an object of properties");
+      for (const auto& [name, value] : props.Members()) p[tool][name] = value.String();
+    }
+    return p;
+  }
+
+  // ---------------------------------------------------------- elements
+
+  void ReadModel(const Node& n) {
+    n.ExpectKeys({"properties", "elements", "selection"});
+    if (auto p = n.Find("properties")) m_.modelProperties = ReadProperties(*p);
+    if (auto e = n.Find("elements"))
+      for (const Node& element : e->Elements()) ReadElement(element, "");
+    for (const Reference& r : references_) CheckReference(r);
+    CheckNesting();
+    if (auto s = n.Find("selection"))
+      for (const Node& item : s->Elements()) {
+        if (!m_.FindElement(item.String())) item.Fail("no element \"" + item.String() + "\" in the model");
+        m_.selection.push_back(item.String());
+      }
+  }
+
+  // A name that must denote an element of one of `kinds` (any kind when empty).
+  struct Reference {
+    Node node;
+    std::vector<std::string_view> kinds;
+  };
+
+  void Refer(const Node& node, std::vector<std::string_view> kinds) { references_.push_back({node, std::move(kinds)}); }
+
+  void CheckReference(const Reference& r) const {
+    const std::string name = r.node.String();
+    const ElementSpec* e = m_.FindElement(name);
+    if (!e) r.node.Fail("no element \"" + name + "\" in the model");
+    if (!r.kinds.empty() && std::find(r.kinds.begin(), r.kinds.end(), e->kind) == r.kinds.end()) {
+      std::string want;
+      for (std::string_view k : r.kinds) want += (want.empty() ? "" : " or ") + std::string(k);
+      r.node.Fail("\"" + name + "\" is a " + e->kind + ", not a " + want);
+    }
+  }
+
+  void CheckNesting() const {
+    for (const ElementSpec& e : m_.elements) {
+      // Following nestedIn must end: a class cannot enclose itself.
+      std::set<std::string> seen{e.key};
+      for (const ElementSpec* c = &e; !c->nestedIn.empty();) {
+        c = m_.FindElement(c->nestedIn);
+        if (!seen.insert(c->key).second) nestedNodes_.at(e.key).Fail("classes nested in a circle");
+      }
+    }
+  }
+
+  void ReadElement(const Node& n, const std::string& owner) {
+    n.ExpectObject("an element");
+    ElementSpec e;
+    if (!owner.empty()) {
+      e.kind = n.StringOr("kind", kindForMembers_);
+      if (e.kind != kindForMembers_) n.Member("kind").Fail("this list holds only " + kindForMembers_ + "s");
+    } else {
+      const Node kind = n.Member("kind");
+      e.kind = kind.String();
+      if (std::find(ElementKinds().begin(), ElementKinds().end(), e.kind) == ElementKinds().end()) {
+        std::string list;
+        for (std::string_view k : ElementKinds()) list += (list.empty() ? "" : ", ") + std::string(k);
+        kind.Fail("unknown element kind \"" + e.kind + "\" (expected one of: " + list + ")");
+      }
+      if (e.kind == "Attribute" || e.kind == "Operation")
+        kind.Fail("attributes and operations are listed in their class's \"attributes\" and \"operations\"");
+    }
+
+    std::vector<std::string_view> keys = {"comment", "name", "kind", "stereotype", "displayName", "properties"};
+    if (e.kind == "Class")
+      keys.insert(keys.end(), {"language", "components", "nestedIn", "classKind", "package", "attributes", "operations"});
+    else if (e.kind == "Module")
+      keys.push_back("language");
+    else if (IsRelationKind(e.kind))
+      keys.insert(keys.end(), {"client", "supplier", "relationText"});
+    else if (e.kind == "Association")
+      keys.insert(keys.end(), {"role1", "role2"});
+    else if (e.kind == "Role")
+      keys.insert(keys.end(), {"class", "navigable"});
+    if (e.kind == "ModuleVisibilityRelationship") keys.push_back("unit");
+    n.ExpectKeys(keys);
+
+    const Node name = n.Member("name");
+    e.name = name.String();
+    if (e.name.empty()) name.Fail("an element needs a name");
+    e.key = owner.empty() ? e.name : owner + "." + e.name;
+    if (m_.FindElement(e.key)) name.Fail("a second element \"" + e.key + "\"");
+    e.owner = owner;
+    e.stereotype = n.StringOr("stereotype", "");
+    e.displayName = n.StringOr("displayName", e.name);
+    if (auto p = n.Find("properties")) e.properties = ReadProperties(*p);
+    e.language = n.StringOr("language", "");
+
+    if (auto c = n.Find("components"))
+      for (const Node& m : c->Elements()) {
+        Refer(m, {"Module"});
+        e.components.push_back(m.String());
+      }
+    if (auto nest = n.Find("nestedIn")) {
+      Refer(*nest, {"Class"});
+      e.nestedIn = nest->String();
+      nestedNodes_.emplace(e.key, *nest);
+    }
+    e.classKind = n.StringOr("classKind", e.classKind);
+    if (auto p = n.Find("package")) {
+      p->ExpectKeys({"name", "editable"});
+      e.package = p->StringOr("name", e.package);
+      e.packageEditable = p->BoolOr("editable", true);
+    }
+    for (const char* end : {"client", "supplier"})
+      if (auto r = n.Find(end)) {
+        Refer(*r, {});
+        (std::string_view(end) == "client" ? e.client : e.supplier) = r->String();
+      }
+    e.relationText = n.StringOr("relationText", e.client + " -> " + e.supplier);
+    if (auto u = n.Find("unit")) {
+      u->ExpectKeys({"modifiable"});
+      e.unitModifiable = u->BoolOr("modifiable", true);
+    }
+    for (const char* role : {"role1", "role2"})
+      if (auto r = n.Find(role)) {
+        Refer(*r, {"Role"});
+        (std::string_view(role) == "role1" ? e.role1 : e.role2) = r->String();
+      }
+    if (auto c = n.Find("class")) {
+      Refer(*c, {"Class"});
+      e.roleClass = c->String();
+    }
+    e.navigable = n.BoolOr("navigable", false);
+
+    const std::string key = e.key;
+    const size_t index = m_.elements.size();
+    m_.elements.push_back(std::move(e));
+    for (const char* list : {"attributes", "operations"}) {
+      std::optional<Node> members = n.Find(list);
+      if (!members) continue;
+      kindForMembers_ = std::string_view(list) == "attributes" ? "Attribute" : "Operation";
+      for (const Node& member : members->Elements()) {
+        ReadElement(member, key);
+        (kindForMembers_ == "Attribute" ? m_.elements[index].attributes : m_.elements[index].operations)
+            .push_back(m_.elements.back().key);
+      }
+    }
+  }
+
+  // ----------------------------------------------------------- add-ins
+
+  void ReadAddIns(const Node& n) {
+    std::vector<Node> list = n.Elements();
+    std::map<std::string, int> seen;
+    for (const Node& a : list) {
+      a.ExpectObject("an add-in");
+      AddInSpec spec;
+      spec.name = a.Member("name").String();
+      const int k = ++seen[spec.name];
+      spec.id = k == 1 ? spec.name : spec.name + "#" + std::to_string(k);
+      m_.addins.push_back(std::move(spec));
+    }
+    for (size_t i = 0; i < list.size(); ++i) ReadAddIn(list[i], m_.addins[i]);
+  }
+
+  void ReadAddIn(const Node& n, AddInSpec& a) {
+    n.ExpectKeys({"comment", "name", "settings", "installDirectory", "registryRoot", "helpFile", "contextMenus",
+                  "eventHandler", "menuStates"});
+    if (auto s = n.Find("settings"))
+      for (const auto& [section, entries] : s->Members()) {
+        entries.ExpectObject("an object of entries");
+        for (const auto& [entry, value] : entries.Members()) a.settings[section][entry] = value.String();
+      }
+    a.installDirectory = n.StringOr("installDirectory", "");
+    a.registryRoot = n.StringOr("registryRoot", "");
+    a.helpFile = n.StringOr("helpFile", "");
+    a.contextMenus = n.BoolOr("contextMenus", true);
+    if (auto h = n.Find("eventHandler")) a.eventHandler = ReadCompanion(*h, false);
+    if (auto ms = n.Find("menuStates"))
+      for (const auto& [name, value] : ms->Members()) {
+        CheckValue(value, m_, nullptr, false);
+        a.menuStates[name] = value.json();
+      }
+  }
+
+  // -------------------------------------------------------- companions
+
+  std::shared_ptr<const CompanionSpec> ReadCompanion(const Node& n, bool creatable) {
+    auto c = std::make_shared<CompanionSpec>();
+    if (creatable) {
+      n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "members", "objects"});
+      c->progid = n.StringOr("progid", "");
+      c->clsid = n.StringOr("clsid", "");
+      if (c->progid.empty() && c->clsid.empty()) n.Fail("a companion needs a \"progid\" or a \"clsid\"");
+      if (auto cr = n.Find("create")) {
+        if (cr->json().is_boolean()) {
+          if (!cr->Bool()) cr->Fail("write {\"error\": {...}} for a companion that cannot be created");
+        } else {
+          cr->ExpectKeys({"error"});
+          c->createError = ParseError(cr->Member("error"));
+        }
+      }
+    } else {
+      n.ExpectKeys({"comment", "operations", "members", "objects"});
+    }
+    if (auto ops = n.Find("operations"))
+      for (const Node& op : ops->Elements()) c->operations.push_back(op.String());
+    if (auto objs = n.Find("objects"))
+      for (const auto& [name, spec] : objs->Members()) c->objects[name] = ReadCompanion(spec, false);
+    if (auto members = n.Find("members"))
+      for (const auto& [name, spec] : members->Members()) {
+        if (c->FindMember(name)) members->FailKey(name, "a second member \"" + name + "\" (names ignore case)");
+        c->members[name] = ReadMember(spec, *c);
+      }
+    return c;
+  }
+
+  MemberSpec ReadMember(const Node& n, const CompanionSpec& owner) {
+    n.ExpectKeys({"comment", "returns", "raise", "setArgs"});
+    MemberSpec m;
+    if (auto r = n.Find("returns")) {
+      if (r->IsObject() && r->json().size() == 1 && r->json().contains("companion"))
+        m.returnsObject = ReadCompanion(r->Member("companion"), false);
+      else {
+        CheckValue(*r, m_, &owner, false);
+        m.returns = r->json();
+      }
+    }
+    if (auto e = n.Find("raise")) m.raise = ParseError(*e);
+    if (m.raise && (m.returns || m.returnsObject)) n.Member("raise").Fail("a member either returns or raises");
+    if (auto s = n.Find("setArgs"))
+      for (const Node& v : s->Elements()) {
+        if (!(v.IsObject() && v.json().size() == 1 && v.json().contains("keep"))) CheckValue(v, m_, &owner, false);
+        m.setArgs.push_back(v.json());
+      }
+    return m;
+  }
+
+  Node root_;
+  ModelSpec m_;
+  std::vector<Reference> references_;
+  std::map<std::string, Node> nestedNodes_;
+  std::string kindForMembers_;
+};
+
+}  // namespace
+
+ModelSpec LoadModel(const JsonSource& source) { return ModelReader(source).Read(); }
+
+}  // namespace kpx::sim

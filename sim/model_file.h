@@ -1,0 +1,147 @@
+// The model file: the world the add-in meets. Registry, files, clock, the
+// host application with its add-ins, companion components, the resource
+// component and the UML model. Read once, checked completely before the run:
+// every fault names its line.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/platform.h"
+#include "sim/json_source.h"
+
+namespace kpx::sim {
+
+// Orders text without regard to ASCII letter case: add-in settings,
+// properties, member names and ProgIDs are looked up that way.
+struct NoCaseLess {
+  bool operator()(std::string_view a, std::string_view b) const;
+  using is_transparent = void;
+};
+
+struct ErrorSpec {
+  int32_t number = 0;
+  std::string description;
+};
+
+// One registry value to put in place (or only a key, when `name` is unset).
+struct RegistryEntry {
+  platform::RootKey root = platform::RootKey::LocalMachine;
+  std::string key;
+  std::optional<std::string> name;  // "" is the key's default value
+  platform::RegistryValue value;
+};
+
+struct ClockSetting {
+  std::optional<platform::DateTime> date;  // only year, month, day used
+  std::optional<double> seconds;           // since midnight
+  std::optional<double> step;              // added after each Timer read
+};
+
+// A companion member: what a call answers.
+struct CompanionSpec;
+struct MemberSpec {
+  std::optional<InputJson> returns;                   // a value (checked)
+  std::shared_ptr<const CompanionSpec> returnsObject;  // or a companion of its own
+  std::optional<ErrorSpec> raise;
+  std::vector<InputJson> setArgs;  // written back to by-reference arguments, by position
+};
+
+struct CompanionSpec {
+  std::string progid;  // one of progid and clsid names how it is created
+  std::string clsid;
+  std::optional<ErrorSpec> createError;
+  std::vector<std::string> operations;  // its own interface, in order
+  std::map<std::string, MemberSpec, NoCaseLess> members;
+  std::map<std::string, std::shared_ptr<const CompanionSpec>> objects;
+
+  const MemberSpec* FindMember(std::string_view name) const;
+};
+
+using Settings = std::map<std::string, std::map<std::string, std::string, NoCaseLess>, NoCaseLess>;
+
+struct AddInSpec {
+  std::string name;
+  std::string id;  // name, or "name#k" for the k-th add-in of that name
+  Settings settings;
+  std::string installDirectory, registryRoot, helpFile;
+  bool contextMenus = true;
+  std::shared_ptr<const CompanionSpec> eventHandler;
+  std::map<std::string, InputJson> menuStates;  // initial "MenuState" by internal name
+};
+
+struct ApplicationSpec {
+  std::string path = "C:\\Program Files\\Quarn";
+  int32_t mainWindow = 4242;
+  int16_t top = 0, left = 0, height = 600, width = 800;
+  std::map<std::string, ErrorSpec, NoCaseLess> failingScripts;
+};
+
+using Properties = std::map<std::string, std::map<std::string, std::string, NoCaseLess>, NoCaseLess>;
+
+// One model element. `key` is how files and scenarios name it: the name for
+// top-level elements, "Class.member" for attributes and operations.
+struct ElementSpec {
+  std::string key, name, kind, stereotype, displayName;
+  Properties properties;
+  // Class and module.
+  std::string language;
+  // Class.
+  std::vector<std::string> components, attributes, operations;
+  std::string nestedIn;
+  std::string classKind = "Normal";
+  std::string package = "Logical View";
+  bool packageEditable = true;
+  // Attribute and operation.
+  std::string owner;
+  // Relations.
+  std::string client, supplier, relationText;
+  bool unitModifiable = true;
+  // Association and role.
+  std::string role1, role2, roleClass;
+  bool navigable = false;
+};
+
+struct ModelSpec {
+  std::vector<RegistryEntry> registry;
+  std::vector<std::pair<std::string, std::string>> files;
+  std::vector<std::string> folders;
+  ClockSetting clock;
+  ApplicationSpec application;
+  std::vector<AddInSpec> addins;
+  std::vector<std::shared_ptr<const CompanionSpec>> companions;
+  std::map<int32_t, std::string> resources;
+  bool resourceRegistered = true;
+  Properties modelProperties;
+  std::vector<ElementSpec> elements;
+  std::vector<std::string> selection;
+
+  const ElementSpec* FindElement(std::string_view key) const;
+  const AddInSpec* FindAddIn(std::string_view id) const;
+};
+
+// The element kinds the simulated host knows, as IdentifyClass names them.
+const std::vector<std::string_view>& ElementKinds();
+bool IsRelationKind(std::string_view kind);
+
+// Reads a model file. Raises InputError.
+ModelSpec LoadModel(const JsonSource& source);
+
+// Pieces the scenario file shares with the model file.
+std::vector<RegistryEntry> ParseRegistry(const Node& node);
+ClockSetting ParseClock(const Node& node);
+// {"number": n, "description": "..."}
+ErrorSpec ParseError(const Node& node);
+
+// Checks a value of the files (the forms are in values.h) against the model.
+// `owner` is the companion whose sub-objects a value may name (none outside
+// companions); `byRef` allows one {"byref": ...} wrapper at the top.
+void CheckValue(const Node& value, const ModelSpec& model, const CompanionSpec* owner, bool byRef);
+
+}  // namespace kpx::sim

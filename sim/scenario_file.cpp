@@ -1,0 +1,129 @@
+#include "sim/scenario_file.h"
+
+#include <algorithm>
+
+#include "addin/api_members.h"
+#include "automation/vb_strings.h"
+
+namespace kpx::sim {
+
+std::optional<std::filesystem::path> ScenarioModelPath(const JsonSource& scenario) {
+  std::optional<Node> model = Node::Root(scenario).Find("model");
+  if (!model) return std::nullopt;
+  const std::string name = model->String();
+  if (name.empty()) model->Fail("empty model path");
+  return std::filesystem::path(scenario.name()).parent_path() / name;
+}
+
+namespace {
+
+constexpr std::string_view kActionKeys[] = {"call",  "select",  "answer",      "clock",
+                                            "release", "create", "setRegistry", "setFile"};
+
+const ApiMember* FindMember(std::string_view name) {
+  for (const ApiMember& m : ApiMembers())
+    if (EqualsNoCase(m.name, name)) return &m;
+  return nullptr;
+}
+
+void ReadCall(const Node& n, const ModelSpec& model, Action& a) {
+  n.ExpectKeys({"comment", "call", "args", "kind"});
+  const Node name = n.Member("call");
+  const ApiMember* member = FindMember(name.String());
+  if (!member) name.Fail("the add-in has no member \"" + name.String() + "\"");
+  a.member = member->name;
+  a.kind = member->kind;
+  if (auto k = n.Find("kind")) {
+    const std::string kind = k->String();
+    if (kind == "method") a.kind = CallKind::Method;
+    else if (kind == "get") a.kind = CallKind::PropertyGet;
+    else k->Fail("a call's kind is \"method\" or \"get\"");
+  }
+  size_t required = 0;
+  for (size_t i = 0; i < member->paramCount; ++i)
+    if (!member->params[i].optional) required = i + 1;
+  std::vector<Node> args;
+  if (auto list = n.Find("args")) args = list->Elements();
+  if (args.size() < required || args.size() > member->paramCount) {
+    std::string expected = std::to_string(required);
+    if (member->paramCount != required) expected += " to " + std::to_string(member->paramCount);
+    const Node where = n.Find("args") ? n.Member("args") : name;
+    where.Fail(a.member + " takes " + expected + " argument" + (member->paramCount == 1 ? "" : "s") + ", not " +
+               std::to_string(args.size()));
+  }
+  for (const Node& arg : args) {
+    CheckValue(arg, model, nullptr, true);
+    a.args.push_back(arg.json());
+  }
+}
+
+}  // namespace
+
+ScenarioSpec LoadScenario(const JsonSource& source, const ModelSpec& model) {
+  const Node root = Node::Root(source);
+  root.ExpectKeys({"comment", "model", "actions"});
+  ScenarioSpec s;
+  std::vector<Node> actions = root.Member("actions").Elements();
+  s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create");
+  bool alive = s.implicitCreate;
+
+  for (const Node& n : actions) {
+    n.ExpectObject("an action");
+    Action a;
+    a.line = n.line();
+    a.raw = n.json();
+    std::string which;
+    for (const auto& [key, value] : n.Members()) {
+      if (key == "comment" || key == "args" || key == "kind") continue;
+      if (std::find(std::begin(kActionKeys), std::end(kActionKeys), key) == std::end(kActionKeys))
+        n.FailKey(key, "unknown action \"" + key +
+                           "\" (expected call, select, answer, clock, release, create, setRegistry or setFile)");
+      if (!which.empty()) n.FailKey(key, "one action per entry: \"" + which + "\" and \"" + key + "\"");
+      which = key;
+    }
+    if (which.empty()) n.Fail("an action needs one of call, select, answer, clock, release, create, setRegistry, setFile");
+    const Node body = n.Member(which);
+
+    if (which == "call") {
+      a.type = Action::Type::Call;
+      ReadCall(n, model, a);
+      if (!alive) body.Fail("the add-in object was released: add {\"create\": true} before calling it again");
+    } else {
+      n.ExpectKeys({"comment", std::string_view(which)});
+      if (which == "select") {
+        a.type = Action::Type::Select;
+        for (const Node& item : body.Elements()) {
+          if (!model.FindElement(item.String())) item.Fail("no element \"" + item.String() + "\" in the model");
+          a.select.push_back(item.String());
+        }
+      } else if (which == "answer") {
+        a.type = Action::Type::Answer;
+        body.ExpectKeys({"button"});
+        a.answer = body.Member("button").Int32();
+      } else if (which == "clock") {
+        a.type = Action::Type::Clock;
+        a.clock = ParseClock(body);
+      } else if (which == "release" || which == "create") {
+        if (!body.Bool()) body.Fail("write {\"" + which + "\": true}");
+        const bool create = which == "create";
+        a.type = create ? Action::Type::Create : Action::Type::Release;
+        if (create && alive) body.Fail("the add-in object exists already: release it first");
+        if (!create && !alive) body.Fail("there is no add-in object to release");
+        alive = create;
+      } else if (which == "setRegistry") {
+        a.type = Action::Type::SetRegistry;
+        a.registry = ParseRegistry(body);
+      } else {
+        a.type = Action::Type::SetFile;
+        for (const auto& [path, content] : body.Members()) {
+          if (path.empty()) body.FailKey(path, "empty path");
+          a.files.emplace_back(path, content.IsNull() ? std::nullopt : std::optional<std::string>(content.String()));
+        }
+      }
+    }
+    s.actions.push_back(std::move(a));
+  }
+  return s;
+}
+
+}  // namespace kpx::sim

@@ -1,0 +1,48 @@
+// The scenario file: what the host and the user do, in order. Checked
+// against the model before anything runs, so a typo never shows up halfway
+// through a run.
+#pragma once
+
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "automation/object.h"
+#include "sim/json_source.h"
+#include "sim/model_file.h"
+
+namespace kpx::sim {
+
+struct Action {
+  enum class Type { Call, Select, Answer, Clock, Release, Create, SetRegistry, SetFile };
+  Type type = Type::Call;
+  int line = 0;
+  InputJson raw;  // as written, for the log
+
+  // Call: the member's name as the add-in spells it, how it is called, and
+  // the arguments (checked values, possibly {"byref": ...}).
+  std::string member;
+  CallKind kind = CallKind::Method;
+  std::vector<InputJson> args;
+
+  std::vector<std::string> select;
+  int answer = 0;
+  ClockSetting clock;
+  std::vector<RegistryEntry> registry;
+  std::vector<std::pair<std::string, std::optional<std::string>>> files;  // no content: delete
+};
+
+struct ScenarioSpec {
+  std::vector<Action> actions;
+  // The run creates the add-in object itself unless the first action does.
+  bool implicitCreate = true;
+};
+
+// The model file the scenario names, relative to the scenario's folder.
+std::optional<std::filesystem::path> ScenarioModelPath(const JsonSource& scenario);
+
+ScenarioSpec LoadScenario(const JsonSource& source, const ModelSpec& model);
+
+}  // namespace kpx::sim

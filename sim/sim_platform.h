@@ -1,0 +1,164 @@
+// The outside world as the simulated host offers it to the add-in: a virtual
+// clock, a scripted user, and recording wrappers around whatever registry,
+// files and object factory the run is given. The wrappers write every effect
+// into the event log and pass the call on unchanged.
+#pragma once
+
+#include <cstdint>
+#include <deque>
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "platform/platform.h"
+#include "shared/shared_debug_logger.h"
+#include "sim/event_log.h"
+#include "sim/model_file.h"
+
+namespace kpx::sim {
+
+// ------------------------------------------------------------------- clock
+
+// Time stands still unless told otherwise: each Timer() read moves it on by
+// `step` seconds, each Sleep by its length. Runs are repeatable to the bit.
+class VirtualClock final : public platform::Clock {
+ public:
+  VirtualClock();
+  void Set(const ClockSetting& setting);
+
+  float Timer() override;
+  platform::DateTime Now() override;
+  void Sleep(uint32_t milliseconds) override { Advance(milliseconds / 1000.0); }
+
+  double seconds() const { return seconds_; }
+
+ private:
+  void Advance(double seconds);
+  platform::DateTime date_;
+  double seconds_ = 0;
+  double step_ = 0;
+};
+
+class RecordingClock final : public platform::Clock {
+ public:
+  RecordingClock(platform::Clock& inner, EventLog& log) : inner_(inner), log_(log) {}
+  float Timer() override { return inner_.Timer(); }
+  platform::DateTime Now() override { return inner_.Now(); }
+  void Sleep(uint32_t milliseconds) override;
+
+ private:
+  platform::Clock& inner_;
+  EventLog& log_;
+};
+
+// ----------------------------------------------------------- user interface
+
+// Plays the user: message boxes take the answers the scenario queued, OK
+// otherwise. There is no real user to wrap, so it records itself.
+class SimUserInterface final : public platform::UserInterface {
+ public:
+  explicit SimUserInterface(EventLog& log) : log_(log) {}
+  void QueueAnswer(int button) { answers_.push_back(button); }
+  const std::deque<int>& pendingAnswers() const { return answers_; }
+
+  int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
+  bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
+  void DoEvents() override;
+
+ private:
+  EventLog& log_;
+  std::deque<int> answers_;
+};
+
+// ---------------------------------------------------------------- registry
+
+class RecordingRegistry final : public platform::Registry {
+ public:
+  RecordingRegistry(platform::Registry& inner, EventLog& log) : inner_(inner), log_(log) {}
+  std::optional<platform::RegistryValue> QueryValue(platform::RootKey root, std::string_view key,
+                                                    std::string_view name) override;
+  bool SetValue(platform::RootKey root, std::string_view key, std::string_view name,
+                const platform::RegistryValue& value) override;
+  platform::KeyDisposition CreateKey(platform::RootKey root, std::string_view key) override;
+  std::string ToAnsi(std::string_view utf8) override { return inner_.ToAnsi(utf8); }
+  std::string FromAnsi(std::string_view ansi) override { return inner_.FromAnsi(ansi); }
+
+ private:
+  platform::Registry& inner_;
+  EventLog& log_;
+};
+
+// "HKLM" or "HKCU".
+std::string RootName(platform::RootKey root);
+// A registry value as the log shows it: REG_SZ as its text, REG_DWORD as an
+// unsigned number, anything else as {"binary": "hex"}.
+EventJson RegistryValueJson(const platform::RegistryValue& value);
+std::string RegistryTypeName(uint32_t type);
+
+// Puts registry entries in place through the plain interface: the key is
+// created, then the value set. Nothing is recorded.
+void SeedRegistry(platform::Registry& registry, const std::vector<RegistryEntry>& entries);
+
+// ------------------------------------------------------------------- files
+
+// Where the add-in's debug log lies, found the way the add-in finds it: by
+// the logger's own settings loader, run over an unrecorded registry the
+// first time the answer is needed (the add-in's logger, too, loads on first
+// use and never again).
+class DebugLogLocator {
+ public:
+  explicit DebugLogLocator(const platform::Platform& unrecorded) : platform_(unrecorded), logger_(platform_) {}
+  const std::string& Path() { return logger_.DebugOutputPath(); }
+
+ private:
+  platform::Platform platform_;
+  DebugLogger logger_;
+};
+
+class RecordingFileSystem final : public platform::FileSystem {
+ public:
+  RecordingFileSystem(platform::FileSystem& inner, EventLog& log, DebugLogLocator& debugLog)
+      : inner_(inner), log_(log), debugLog_(debugLog) {}
+  bool Exists(std::string_view path) override;
+  bool DeleteFile(std::string_view path) override;
+  bool AppendText(std::string_view path, std::string_view text) override;
+
+ private:
+  platform::FileSystem& inner_;
+  EventLog& log_;
+  DebugLogLocator& debugLog_;
+};
+
+// Lays out the model's folders and files before the run. The platform's
+// file interface only appends and deletes, so this is the sim's own door:
+// `hostPath` maps a Windows path to where it really lies.
+class FileSeeder {
+ public:
+  explicit FileSeeder(std::function<std::filesystem::path(std::string_view)> hostPath)
+      : hostPath_(std::move(hostPath)) {}
+  void MakeFolder(std::string_view windowsPath);
+  // Replaces the file with exactly `content`, making its folder if needed.
+  void WriteFile(std::string_view windowsPath, std::string_view content);
+  void RemoveFile(std::string_view windowsPath);
+
+ private:
+  std::function<std::filesystem::path(std::string_view)> hostPath_;
+};
+
+// ----------------------------------------------------------------- objects
+
+class RecordingObjectFactory final : public platform::ObjectFactory {
+ public:
+  RecordingObjectFactory(platform::ObjectFactory& inner, EventLog& log) : inner_(inner), log_(log) {}
+  ObjectPtr CreateObject(std::string_view progId) override;
+  ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) override;
+
+ private:
+  ObjectPtr Record(EventJson event, const std::function<ObjectPtr()>& create);
+  platform::ObjectFactory& inner_;
+  EventLog& log_;
+};
+
+}  // namespace kpx::sim

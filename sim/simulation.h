@@ -1,0 +1,73 @@
+// One run of the simulated host: the world of a model file, the add-in
+// object made and called as a scenario says, and the event log of it all.
+#pragma once
+
+#include <memory>
+
+#include "addin/api.h"
+#include "platform/platform.h"
+#include "shared/module.h"
+#include "sim/companions.h"
+#include "sim/event_log.h"
+#include "sim/model_file.h"
+#include "sim/scenario_file.h"
+#include "sim/sim_platform.h"
+#include "sim/world.h"
+
+namespace kpx::sim {
+
+// What a run is given from outside: the native build hands in a registry
+// file and a sandbox; a Windows test host would hand in the real ones.
+struct Environment {
+  platform::Registry& registry;
+  platform::FileSystem& files;
+  FileSeeder& seeder;
+};
+
+class Simulation {
+ public:
+  // `model` must outlive the simulation.
+  Simulation(const ModelSpec& model, Environment environment);
+  ~Simulation();
+  Simulation(const Simulation&) = delete;
+  Simulation& operator=(const Simulation&) = delete;
+
+  // Puts the model's registry, folders, files and clock in place. Run() does
+  // it first; tests that drive the world by hand call it themselves.
+  void Prepare();
+  // Prepares, then plays the scenario. Releases the add-in object at the
+  // end if the scenario left it alive. Once per simulation.
+  void Run(const ScenarioSpec& scenario);
+
+  const EventLog& log() const { return log_; }
+  EventLog& log() { return log_; }
+  World& world() { return world_; }
+  const platform::Platform& platform() const { return platform_; }
+  const std::shared_ptr<API>& api() const { return api_; }
+
+  // The single steps of a scenario.
+  void Create();
+  void Release(bool implicit);
+  void Apply(const Action& action);
+
+ private:
+  void Call(const Action& action);
+
+  const ModelSpec& model_;
+  Environment env_;
+  EventLog log_;
+  World world_;
+  VirtualClock clock_;
+  SimUserInterface ui_;
+  SimObjectFactory factory_;
+  DebugLogLocator debugLog_;
+  RecordingRegistry registry_;
+  RecordingFileSystem files_;
+  RecordingClock recordingClock_;
+  RecordingObjectFactory objects_;
+  platform::Platform platform_;
+  Module module_;
+  std::shared_ptr<API> api_;
+};
+
+}  // namespace kpx::sim

@@ -1,0 +1,239 @@
+#include "sim/transcript.h"
+
+#include <cstdio>
+#include <map>
+#include <sstream>
+
+namespace kpx::sim {
+
+namespace {
+
+std::string Str(const EventJson& e, const char* key) {
+  auto it = e.find(key);
+  if (it == e.end() || it->is_null()) return {};
+  return it->is_string() ? it->get<std::string>() : it->dump();
+}
+
+// Quotes text for people: Windows paths keep their single backslashes.
+std::string Quoted(const std::string& s) {
+  std::string out = "\"";
+  for (char c : s) {
+    if (c == '"') out += "\\\"";
+    else if (c == '\r') out += "\\r";
+    else if (c == '\n') out += "\\n";
+    else out += c;
+  }
+  return out + "\"";
+}
+
+std::string ErrorText(const EventJson& error) {
+  const int64_t number = error.value("number", int64_t{0});
+  char num[32];
+  if (number < 0) std::snprintf(num, sizeof num, "0x%08X", static_cast<unsigned>(static_cast<uint32_t>(number)));
+  else std::snprintf(num, sizeof num, "%lld", static_cast<long long>(number));
+  return std::string(num) + " " + Str(error, "description");
+}
+
+std::string Args(const EventJson& args) {
+  std::string out;
+  for (const EventJson& a : args) out += (out.empty() ? "" : ", ") + ShortValue(a);
+  return out;
+}
+
+std::string RegistryPlace(const EventJson& e) {
+  const std::string name = Str(e, "name");
+  return Str(e, "root") + "\\" + Str(e, "key") + "  " + (name.empty() ? "@" : name);
+}
+
+std::string RegistryValueText(const EventJson& value) {
+  if (value.is_string()) return Quoted(value.get<std::string>());
+  return value.dump();
+}
+
+std::string Line(const char* tag, const std::string& text) {
+  char head[16];
+  std::snprintf(head, sizeof head, "  %-9s ", tag);
+  return head + text;
+}
+
+std::string Plural(uint64_t n, const char* one, const char* many) {
+  return std::to_string(n) + " " + (n == 1 ? one : many);
+}
+
+}  // namespace
+
+std::string ShortValue(const EventJson& v) {
+  if (v.is_null()) return "Empty";
+  if (v.is_boolean()) return v.get<bool>() ? "True" : "False";
+  if (v.is_string()) return Quoted(v.get<std::string>());
+  if (v.is_number()) return v.dump();
+  if (v.is_object() && v.size() == 1) {
+    const std::string& form = v.begin().key();
+    const EventJson& inner = v.begin().value();
+    if (form == "object") return inner.is_null() ? "Nothing" : inner.get<std::string>();
+    if (form == "null") return "Null";
+    if (form == "byref") return "byref " + ShortValue(inner);
+  }
+  return v.dump();
+}
+
+std::string TranscriptLine(const EventJson& e) {
+  const std::string ev = Str(e, "ev");
+  const std::string hostCalls = e.contains("hostCalls") ? "   [" + Plural(e["hostCalls"].get<uint64_t>(), "host call", "host calls") + "]" : "";
+  if (ev == "create")
+    return Line("create", e.value("ok", false) ? "add-in object created" : "FAILED " + ErrorText(e["error"]));
+  if (ev == "release") {
+    std::string text = e.value("implicit", false) ? "add-in object released at the end" : "add-in object released";
+    if (e.contains("skipped")) text = "nothing to release";
+    return Line("release", text);
+  }
+  if (ev == "object-create") {
+    const std::string how = e.contains("progid") ? "CreateObject(" + Str(e, "progid") + ")" : "New " + Str(e, "clsid");
+    return Line("object", e.value("ok", false) ? Str(e, "instance") + " = " + how : how + " FAILED " + ErrorText(e["error"]));
+  }
+  if (ev == "call") return Line("call", Str(e, "member") + "(" + Args(e["args"]) + ")");
+  if (ev == "result") {
+    std::string text = Str(e, "member") + " = " + ShortValue(e["value"]);
+    if (e.contains("byref"))
+      for (const auto& [pos, value] : e["byref"].items()) text += ", arg " + pos + " = " + ShortValue(value);
+    return Line("result", text + hostCalls);
+  }
+  if (ev == "error") return Line("error", Str(e, "member") + " raised " + ErrorText(e) + hostCalls);
+  if (ev == "skip") return Line("skip", Str(e, "member") + " (" + Str(e, "reason") + ")");
+  if (ev == "registry-read") {
+    const std::string value =
+        e["value"].is_null() ? "(missing)" : RegistryValueText(e["value"]) + " (" + Str(e, "type") + ")";
+    return Line("reg read", RegistryPlace(e) + " = " + value);
+  }
+  if (ev == "registry-write")
+    return Line("reg write", RegistryPlace(e) + " := " + RegistryValueText(e["value"]) + " (" + Str(e, "type") + ")" +
+                                 (e.value("written", false) ? "" : " NOT WRITTEN"));
+  if (ev == "registry-create") return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition"));
+  if (ev == "file-exists") return Line("file", "exists " + Str(e, "path") + "? " + (e.value("exists", false) ? "yes" : "no"));
+  if (ev == "file-delete")
+    return Line("file", "delete " + Str(e, "path") + (e.value("ok", false) ? "" : " (nothing deleted)"));
+  if (ev == "file-append")
+    return Line("file", "append " + Str(e, "path") + " " + Quoted(Str(e, "text")) + (e.value("ok", false) ? "" : " FAILED"));
+  if (ev == "debuglog") return Line("log", Str(e, "line") + (e.value("ok", false) ? "" : "   [not written]"));
+  if (ev == "sleep") return Line("sleep", Str(e, "ms") + " ms");
+  if (ev == "doevents") return Line("doevents", "");
+  if (ev == "messagebox")
+    return Line("msgbox", Quoted(Str(e, "text")) + " title " + Quoted(Str(e, "title")) + " style " + Str(e, "style") +
+                              " -> " + Str(e, "answer") + " (" + Str(e, "answered") + ")");
+  if (ev == "help")
+    return Line("help", Str(e, "file") + " command " + Str(e, "command") + " data " + Str(e, "data") + " window " +
+                            Str(e, "window"));
+  if (ev == "hostlog") return Line("hostlog", Quoted(Str(e, "text")));
+  if (ev == "addin") return Line("addin", Str(e, "addin") + "." + Str(e, "action"));
+  if (ev == "menu-add")
+    return Line("menu", Str(e, "addin") + " add [" + Str(e, "itemType") + "] " + Quoted(Str(e, "caption")) +
+                            (Str(e, "name").empty() ? "" : " " + Str(e, "name")));
+  if (ev == "menu-state")
+    return Line("menu", Str(e, "addin") + " " + Str(e, "name") + ".MenuState := " + ShortValue(e["value"]));
+  if (ev == "setting-read")
+    return Line("setting", Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " -> " +
+                               Quoted(Str(e, "value")) + (e.value("found", false) ? "" : " (default)"));
+  if (ev == "setting-write")
+    return Line("setting", Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " := " +
+                               Quoted(Str(e, "value")));
+  if (ev == "companion-call") {
+    std::string text = Str(e, "instance") + ".";
+    if (e.contains("member")) text += Str(e, "member");
+    else text += "operation " + Str(e, "operation");
+    if (e.contains("args")) text += "(" + Args(e["args"]) + ")";
+    if (e.contains("error")) return Line("companion", text + " raised " + ErrorText(e["error"]));
+    text += " = " + ShortValue(e["result"]);
+    if (e.contains("byref"))
+      for (const auto& [pos, value] : e["byref"].items()) text += ", arg " + pos + " = " + ShortValue(value);
+    return Line("companion", text);
+  }
+  if (ev == "script")
+    return Line("script", Str(e, "path") + (e.contains("error") ? " FAILED " + ErrorText(e["error"]) : ""));
+  if (ev == "element-write") {
+    std::string text = Str(e, "element") + "." + Str(e, "member");
+    if (e.contains("tool")) text += "(" + Str(e, "tool") + ", " + Str(e, "property") + ")";
+    return Line("model", text + " := " + ShortValue(e["value"]));
+  }
+  if (ev == "world") {
+    for (const auto& [key, value] : e.items())
+      if (key != "ev") return Line("world", key + " " + value.dump());
+  }
+  if (ev == "unused-answers") return Line("world", "answers never used: " + e["buttons"].dump());
+  return Line(ev.c_str(), e.dump());
+}
+
+std::string Transcript(const std::vector<EventJson>& events, const std::string& title) {
+  std::ostringstream out;
+  out << title << "\n\n";
+  // Members in the order of their first call.
+  std::vector<std::string> members;
+  std::map<std::string, uint64_t> calls, hostCalls, errors;
+  std::vector<std::string> addins, debugLines;
+  uint64_t regRead = 0, regMissing = 0, regWritten = 0, keysCreated = 0, hostLog = 0, companionCalls = 0,
+           deletes = 0, appends = 0, objects = 0, failedObjects = 0, debugFailed = 0;
+  for (const EventJson& e : events) {
+    out << TranscriptLine(e) << '\n';
+    const std::string ev = Str(e, "ev"), member = Str(e, "member");
+    if (ev == "call") {
+      if (!calls.count(member)) members.push_back(member);
+      ++calls[member];
+    } else if (ev == "result" || ev == "error") {
+      hostCalls[member] += e["hostCalls"].get<uint64_t>();
+      if (ev == "error") ++errors[member];
+    } else if (ev == "addin") {
+      addins.push_back(Str(e, "addin") + "." + Str(e, "action"));
+    } else if (ev == "registry-read") {
+      ++regRead;
+      if (e["value"].is_null()) ++regMissing;
+    } else if (ev == "registry-write") {
+      if (e.value("written", false)) ++regWritten;
+    } else if (ev == "registry-create") {
+      ++keysCreated;
+    } else if (ev == "hostlog") {
+      ++hostLog;
+    } else if (ev == "companion-call") {
+      ++companionCalls;
+    } else if (ev == "file-delete") {
+      if (e.value("ok", false)) ++deletes;
+    } else if (ev == "file-append") {
+      ++appends;
+    } else if (ev == "object-create") {
+      ++(e.value("ok", false) ? objects : failedObjects);
+    } else if (ev == "debuglog") {
+      if (e.value("ok", false)) debugLines.push_back(Str(e, "line"));
+      else ++debugFailed;
+    }
+  }
+
+  auto row = [&](const char* label, const std::string& text) {
+    char head[32];
+    std::snprintf(head, sizeof head, "  %-16s ", label);
+    out << head << text << '\n';
+  };
+  auto perMember = [&](const std::map<std::string, uint64_t>& counts) {
+    std::string text;
+    for (const std::string& m : members)
+      if (counts.count(m)) text += (text.empty() ? "" : ", ") + m + " " + std::to_string(counts.at(m));
+    return text.empty() ? std::string("none") : text;
+  };
+  out << "\nsummary\n";
+  row("members called", perMember(calls));
+  row("host calls", perMember(hostCalls));
+  row("raised to host", perMember(errors));
+  std::string activated;
+  for (const std::string& a : addins) activated += (activated.empty() ? "" : ", ") + a;
+  row("add-ins", activated.empty() ? "untouched" : activated);
+  row("registry", Plural(regRead, "value read", "values read") + " (" + std::to_string(regMissing) + " missing), " +
+                      Plural(regWritten, "value written", "values written") + ", " +
+                      Plural(keysCreated, "key created or opened", "keys created or opened"));
+  row("objects", Plural(objects, "created", "created") + ", " + std::to_string(failedObjects) + " failed, " +
+                     Plural(companionCalls, "companion call", "companion calls"));
+  row("files", Plural(deletes, "deleted", "deleted") + ", " + Plural(appends, "other append", "other appends"));
+  row("host log", Plural(hostLog, "line", "lines"));
+  row("debug log", Plural(debugLines.size(), "line written", "lines written") +
+                       (debugFailed ? ", " + Plural(debugFailed, "write failed", "writes failed") : ""));
+  for (const std::string& line : debugLines) out << "    " << line << '\n';
+  return out.str();
+}
+
+}  // namespace kpx::sim

@@ -1,0 +1,61 @@
+#include "sim/world.h"
+
+#include <stdexcept>
+
+#include "sim/companions.h"
+#include "sim/host_objects.h"
+#include "sim/values.h"
+
+namespace kpx::sim {
+
+World::World(const ModelSpec& spec, EventLog& log) : spec_(spec), log_(log), selection_(spec.selection) {
+  for (const AddInSpec& a : spec.addins) addins_.push_back(std::make_shared<AddInObject>(*this, a));
+  auto collection =
+      std::make_shared<CollectionObject>(*this, "$app.AddIns", std::vector<ObjectPtr>(addins_.begin(), addins_.end()),
+                                         false);
+  application_ =
+      std::make_shared<ApplicationObject>(*this, spec.application, std::make_shared<AddInManagerObject>(*this, collection));
+  model_ = std::make_shared<ModelObject>(*this);
+  for (const ElementSpec& e : spec.elements) elements_.push_back(std::make_shared<ElementObject>(*this, e));
+}
+
+World::~World() = default;
+
+ObjectPtr World::application() const { return application_; }
+
+std::shared_ptr<ElementObject> World::FindElement(std::string_view key) const {
+  for (const auto& e : elements_)
+    if (e->spec().key == key) return e;
+  return nullptr;
+}
+
+std::shared_ptr<AddInObject> World::FindAddIn(std::string_view id) const {
+  for (const auto& a : addins_)
+    if (a->spec().id == id) return a;
+  return nullptr;
+}
+
+std::vector<ObjectPtr> World::SelectedItems() const {
+  std::vector<ObjectPtr> items;
+  for (const std::string& key : selection_) items.push_back(FindElement(key));
+  return items;
+}
+
+std::string World::NextLabel(const std::string& base) {
+  const int k = NextInstance(base);
+  return k == 1 ? base : base + "#" + std::to_string(k);
+}
+
+Variant World::ToVariant(const InputJson& value, CompanionObject* owner) const {
+  if (std::optional<Variant> plain = PlainValue(value)) return *plain;
+  if (value.is_string()) return value.get_ref<const std::string&>() == "$app" ? application() : model();
+  const std::string& form = value.begin().key();
+  const std::string name = value.begin().value().get<std::string>();
+  if (form == "element") return ObjectPtr(FindElement(name));
+  if (form == "addin") return ObjectPtr(FindAddIn(name));
+  if (form == "object" && owner) return owner->SubObject(name);
+  // Values are checked when the files are read; this is a fault of the sim.
+  throw std::logic_error("unchecked value " + value.dump());
+}
+
+}  // namespace kpx::sim

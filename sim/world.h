@@ -1,0 +1,66 @@
+// The simulated Quarn host as a whole: the application object with its
+// add-ins, the UML model with its elements, the companions' instance
+// counters, and the conversion of file values into live variants.
+#pragma once
+
+#include <map>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "automation/variant.h"
+#include "sim/event_log.h"
+#include "sim/model_file.h"
+
+namespace kpx::sim {
+
+class ApplicationObject;
+class AddInObject;
+class CompanionObject;
+class ElementObject;
+
+class World {
+ public:
+  World(const ModelSpec& spec, EventLog& log);
+  ~World();
+  World(const World&) = delete;
+  World& operator=(const World&) = delete;
+
+  EventLog& log() { return log_; }
+  const ModelSpec& spec() const { return spec_; }
+
+  ObjectPtr application() const;
+  ObjectPtr model() const { return model_; }
+  // By key ("CFoo", "CFoo.m_x"); nullptr when there is none.
+  std::shared_ptr<ElementObject> FindElement(std::string_view key) const;
+  const std::vector<std::shared_ptr<ElementObject>>& elements() const { return elements_; }
+  // By id ("VC++", "VisualStudio#2"); nullptr when there is none.
+  std::shared_ptr<AddInObject> FindAddIn(std::string_view id) const;
+  const std::vector<std::shared_ptr<AddInObject>>& addins() const { return addins_; }
+
+  // The model's selection, as element keys (checked by the caller).
+  void Select(std::vector<std::string> keys) { selection_ = std::move(keys); }
+  std::vector<ObjectPtr> SelectedItems() const;
+
+  // A checked value of the files as a variant; `owner` resolves a
+  // companion's {"object": name}.
+  Variant ToVariant(const InputJson& value, CompanionObject* owner = nullptr) const;
+
+  // Numbers instances per kind of thing: 1, 2, 3 ...
+  int NextInstance(const std::string& base) { return ++instances_[base]; }
+  // "base" for the first instance, "base#k" for the k-th.
+  std::string NextLabel(const std::string& base);
+
+ private:
+  const ModelSpec& spec_;
+  EventLog& log_;
+  std::shared_ptr<ApplicationObject> application_;
+  ObjectPtr model_;
+  std::vector<std::shared_ptr<ElementObject>> elements_;
+  std::vector<std::shared_ptr<AddInObject>> addins_;
+  std::vector<std::string> selection_;
+  std::map<std::string, int> instances_;
+};
+
+}  // namespace kpx::sim
