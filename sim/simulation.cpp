@@ -24,6 +24,8 @@ Simulation::~Simulation() {
 }
 
 void Simulation::Prepare() {
+  if (prepared_) return;
+  prepared_ = true;
   SeedRegistry(env_.registry, model_.registry);
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
   for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);

@@ -32,8 +32,8 @@ class Simulation {
   Simulation(const Simulation&) = delete;
   Simulation& operator=(const Simulation&) = delete;
 
-  // Puts the model's registry, folders, files and clock in place. Run() does
-  // it first; tests that drive the world by hand call it themselves.
+  // Puts the model's registry, folders, files and clock in place, once.
+  // Run() does it first; tests that drive the world by hand call it.
   void Prepare();
   // Prepares, then plays the scenario. Releases the add-in object at the
   // end if the scenario left it alive. Once per simulation.
@@ -68,6 +68,7 @@ class Simulation {
   platform::Platform platform_;
   Module module_;
   std::shared_ptr<API> api_;
+  bool prepared_ = false;
 };
 
 }  // namespace kpx::sim
