@@ -5,7 +5,7 @@ NATIVE_DIR := $(BUILD)/native
 WIN64_DIR  := $(BUILD)/win-x64
 WIN32_DIR  := $(BUILD)/win-x86
 
-.PHONY: all setup native windows test demo bench clean
+.PHONY: all setup native windows wintest test demo bench clean
 
 all: native
 
@@ -24,8 +24,13 @@ windows:
 	cmake -S . -B $(WIN32_DIR) -DCMAKE_TOOLCHAIN_FILE=cmake/mingw-i686.cmake -DCMAKE_BUILD_TYPE=Release
 	cmake --build $(WIN32_DIR) -j $(JOBS)
 
+# The Windows DLLs under Wine, driven through COM by the test host.
+wintest: windows
+	BUILD=$(BUILD) wintest/run.sh
+
 test: setup native windows
 	cd $(NATIVE_DIR) && ctest --output-on-failure -j $(JOBS)
+	BUILD=$(BUILD) wintest/run.sh
 
 demo: native
 	$(NATIVE_DIR)/sim/kpx-sim examples/demo/model.json examples/demo/scenario.json --sandbox $(BUILD)/demo-sandbox

@@ -1,0 +1,764 @@
+// The Windows test host: registers the add-in, creates kpxAddIn.API with
+// CoCreateInstance and drives it through IDispatch the way the Quarn host
+// does, with host objects of its own. It also checks the Win32 platform
+// layer and the COM bridge directly against those host objects.
+//
+// Usage: kpx-wintest <kpxaddin.dll> <kpxres.dll> <scratch folder>
+// (Windows paths). Prints "N checks, M failed"; exits 1 on any failure.
+
+#include "platform/win32/win32_api.h"
+
+#include <initguid.h>
+
+#include <cstdio>
+#include <cstring>
+#include <string>
+
+#include "api_h.h"
+#include "kpxres_h.h"
+
+#include "addin/api_members.h"
+#include "automation/automation_error.h"
+#include "automation/object.h"
+#include "calls.h"
+#include "check.h"
+#include "host_object.h"
+#include "platform/win32/com_bridge.h"
+#include "platform/win32/dispatch_object.h"
+#include "platform/win32/win32_platform.h"
+#include "platform/win32/win32_strings.h"
+#include "shared/resource_strings.h"
+#include "shared/resource_texts.h"
+#include "shared/shared_registryapi2.h"
+#include "system.h"
+
+namespace wintest {
+
+Tally& tally() {
+  static Tally t;
+  return t;
+}
+
+namespace {
+
+constexpr HRESULT VbError(int number) { return static_cast<HRESULT>(0x800A0000u | static_cast<unsigned>(number)); }
+
+struct Paths {
+  std::wstring addin;
+  std::wstring res;
+  std::wstring scratch;
+  std::wstring Log() const { return scratch + L"\\addin.log"; }
+};
+
+std::wstring Text(int32_t id) {
+  const char* text = kpx::FindResourceText(id);
+  return text ? Widen(text) : L"";
+}
+
+std::wstring Guid(const GUID& g) { return kpx::win32::GuidToWide(g); }
+
+std::vector<std::wstring> AddInKeys() {
+  return {L"CLSID\\" + Guid(CLSID_API),           L"CLSID\\" + Guid(CLSID_TokenScanner),
+          L"kpxAddIn.API",                        L"kpxAddIn.TokenScanner",
+          L"TypeLib\\" + Guid(LIBID_kpxAddIn),    L"Interface\\" + Guid(DIID__API),
+          L"Interface\\" + Guid(DIID__TokenScanner), L"Interface\\" + Guid(DIID__Delimiters)};
+}
+
+std::vector<std::wstring> ResourceKeys() {
+  return {L"CLSID\\" + Guid(CLSID_KPXResourceInterface), L"kpxres.KPXResourceInterface",
+          L"TypeLib\\" + Guid(LIBID_kpxres), L"Interface\\" + Guid(IID__KPXResourceInterface)};
+}
+
+bool Contains(const std::set<std::wstring>& set, const std::wstring& line) { return set.count(line) != 0; }
+
+Ref<IDispatch> Create(const wchar_t* progId, HRESULT* hr = nullptr) {
+  CLSID clsid;
+  Ref<IDispatch> out;
+  HRESULT result = CLSIDFromProgID(progId, &clsid);
+  if (SUCCEEDED(result))
+    result = CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, IID_IDispatch, reinterpret_cast<void**>(out.out()));
+  if (hr) *hr = result;
+  return out;
+}
+
+IUnknown* Identity(IUnknown* p) {
+  IUnknown* u = nullptr;
+  p->QueryInterface(IID_IUnknown, reinterpret_cast<void**>(&u));
+  if (u) u->Release();
+  return u;
+}
+
+// ------------------------------------------------------------ registration
+
+void RegistrationRoundTrip(const Paths& paths) {
+  Group("regsvr32 writes the classes, ProgIDs and type library, and /u removes every key it wrote");
+  for (int pass = 0; pass < 2; ++pass) {
+    const bool addin = pass == 0;
+    const std::wstring& dll = addin ? paths.addin : paths.res;
+    const std::vector<std::wstring> keys = addin ? AddInKeys() : ResourceKeys();
+
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> before = SnapshotClassesRoot(keys);
+    CHECK(before.empty());
+
+    CHECK_EQ(Regsvr32(dll, false), 0ul);
+    const std::set<std::wstring> registered = SnapshotClassesRoot(keys);
+    const CLSID& clsid = addin ? CLSID_API : CLSID_KPXResourceInterface;
+    const std::wstring progId = addin ? L"kpxAddIn.API" : L"kpxres.KPXResourceInterface";
+    const std::wstring classKey = L"CLSID\\" + Guid(clsid);
+    const std::wstring libid = Guid(addin ? LIBID_kpxAddIn : LIBID_kpxres);
+    CHECK(Contains(registered, classKey + L"\\InprocServer32|=1:" + dll));
+    CHECK(Contains(registered, classKey + L"\\InprocServer32|ThreadingModel=1:Apartment"));
+    CHECK(Contains(registered, classKey + L"\\ProgID|=1:" + progId));
+    CHECK(Contains(registered, classKey + L"\\TypeLib|=1:" + libid));
+    CHECK(Contains(registered, progId + L"\\CLSID|=1:" + Guid(clsid)));
+    const wchar_t* platform = sizeof(void*) == 8 ? L"win64" : L"win32";
+    CHECK(Contains(registered, L"TypeLib\\" + libid + L"\\1.0\\0\\" + platform + L"|=1:" + dll));
+    const std::wstring interfaceKey = L"Interface\\" + Guid(addin ? DIID__API : IID__KPXResourceInterface);
+    CHECK(Contains(registered, interfaceKey));
+    if (addin) {
+      CHECK(Contains(registered, L"CLSID\\" + Guid(CLSID_TokenScanner) + L"\\InprocServer32|=1:" + dll));
+      CHECK(Contains(registered, L"kpxAddIn.TokenScanner\\CLSID|=1:" + Guid(CLSID_TokenScanner)));
+    }
+
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> after = SnapshotClassesRoot(keys);
+    CHECK(after == before);
+    for (const std::wstring& left : after) std::printf("  left behind: %s\n", Narrow(left).c_str());
+
+    CHECK_EQ(Regsvr32(dll, false), 0ul);  // registered again for what follows
+  }
+}
+
+// ---------------------------------------------------------------- host
+
+constexpr const char* kHostKey = "SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VisualStudio";
+
+// The host application with its add-in manager, collection and two add-ins.
+struct Host {
+  Ref<HostObject> app = HostObject::Make(L"app");
+  Ref<HostObject> manager = HostObject::Make(L"manager");
+  Ref<HostObject> addIns = HostObject::Make(L"addins");
+  Ref<HostObject> ownAddIn = HostObject::Make(L"vc");
+  Ref<HostObject> visualStudio = HostObject::Make(L"vs");
+  Ref<HostObject> menuEntry = HostObject::Make(L"entry");
+
+  Host() {
+    app->Object(12544, L"AddInManager", manager.get()).Method(213, L"WriteErrorLog");
+    manager->Object(12529, L"AddIns", addIns.get());
+    VARIANT count;
+    count.vt = VT_I2;
+    count.iVal = 2;
+    addIns->Value(202, L"Count", count);
+    HostObject* vc = ownAddIn.get();
+    HostObject* vs = visualStudio.get();
+    addIns->On(203, L"GetAt", [vc, vs](DISPPARAMS& p, VARIANT* result, EXCEPINFO*) {
+      VARIANT index;
+      VariantInit(&index);
+      if (p.cArgs != 1 || FAILED(VariantChangeType(&index, &Arg(p, 0), 0, VT_I2))) return DISP_E_TYPEMISMATCH;
+      HostObject* item = index.iVal == 1 ? vc : index.iVal == 2 ? vs : nullptr;
+      if (!item) return DISP_E_BADINDEX;
+      result->vt = VT_DISPATCH;
+      result->pdispVal = item;
+      item->AddRef();
+      return S_OK;
+    });
+    ownAddIn->Text(12540, L"Name", L"VC++").Method(12542, L"Deactivate").Method(12543, L"Activate");
+    visualStudio->Text(12540, L"Name", L"VisualStudio").Method(12542, L"Deactivate").Method(12543, L"Activate");
+    menuEntry->Method(1, L"MenuState");
+    ownAddIn->Object(12684, L"AddContextMenuItem", menuEntry.get());
+  }
+  ~Host() {
+    // The objects hand each other out; drop those links so all are freed.
+    for (HostObject* o : {app.get(), manager.get(), addIns.get(), ownAddIn.get(), visualStudio.get(), menuEntry.get()})
+      o->Clear();
+  }
+};
+
+// ------------------------------------------------------- creation, type info
+
+void CreationAndTypeInformation() {
+  Group("kpxAddIn.API is created by ProgID and describes itself from its type library");
+  HRESULT hr = E_FAIL;
+  Ref<IDispatch> api = Create(L"kpxAddIn.API", &hr);
+  CHECK_HR(hr, S_OK);
+  if (!api) return;
+
+  UINT count = 0;
+  CHECK_HR(api->GetTypeInfoCount(&count), S_OK);
+  CHECK_EQ(count, 1u);
+  Ref<ITypeInfo> info;
+  CHECK_HR(api->GetTypeInfo(0, LOCALE_USER_DEFAULT, info.out()), S_OK);
+  if (info) {
+    TYPEATTR* attr = nullptr;
+    info->GetTypeAttr(&attr);
+    CHECK(IsEqualIID(attr->guid, DIID__API));
+    CHECK_EQ(attr->typekind, TKIND_DISPATCH);
+    CHECK_EQ(static_cast<int>(attr->cFuncs), kpx::kApiMemberCount);
+    info->ReleaseTypeAttr(attr);
+  }
+
+  CHECK_EQ(IdOf(api.get(), L"Name"), 18L);
+  CHECK_EQ(IdOf(api.get(), L"onactivate"), 20L);  // names are case-blind
+  CHECK_EQ(IdOf(api.get(), L"OnDeletedModelElement"), 69L);
+  CHECK_EQ(IdOf(api.get(), L"NoSuchMember"), static_cast<long>(DISPID_UNKNOWN));
+
+  Outcome name = Call(api.get(), 18, Flags::Get);
+  CHECK_HR(name.hr, S_OK);
+  CHECK_EQ(name.result.v.vt, VT_BSTR);
+  CHECK(name.result.Text() == L"VC++");
+  // A property read as a method, as some clients do.
+  CHECK(Call(api.get(), 18, Flags::MethodOrGet).result.Text() == L"VC++");
+
+  CHECK_HR(Call(api.get(), 70, Flags::Method).hr, DISP_E_MEMBERNOTFOUND);
+  CHECK_HR(Call(api.get(), 0, Flags::Get).hr, DISP_E_MEMBERNOTFOUND);
+
+  Ref<IUnknown> typed;
+  CHECK_HR(api->QueryInterface(DIID__API, reinterpret_cast<void**>(typed.out())), S_OK);
+  if (typed) CHECK(Identity(typed.get()) == Identity(api.get()));
+  Ref<ISupportErrorInfo> support;
+  CHECK_HR(api->QueryInterface(IID_ISupportErrorInfo, reinterpret_cast<void**>(support.out())), S_OK);
+  if (support) CHECK_HR(support->InterfaceSupportsErrorInfo(DIID__API), S_OK);
+}
+
+// ---------------------------------------------------------------- activation
+
+void Activation(const Paths& paths) {
+  Group("OnActivate with the host application: by-reference object, host calls, debug log");
+  Host host;
+  HRESULT hr = E_FAIL;
+  Ref<IDispatch> api = Create(L"kpxAddIn.API", &hr);
+  CHECK_HR(hr, S_OK);
+  if (!api) return;
+
+  // QuarnApp is Nothing before activation.
+  Outcome before = Call(api.get(), 19, Flags::Get);
+  CHECK_EQ(before.result.v.vt, VT_DISPATCH);
+  CHECK(before.result.v.pdispVal == nullptr);
+
+  // VB passes the host application by reference.
+  IDispatch* app = host.app.get();
+  app->AddRef();
+  const LONG appRefs = host.app->refs();
+  Var byRef = Var::RefDisp(&app);
+  Outcome activated = Call(api.get(), 20, Flags::Method, {&byRef});
+  CHECK_HR(activated.hr, S_OK);
+  CHECK_EQ(activated.result.v.vt, VT_I4);
+  CHECK_EQ(activated.result.v.lVal, 0L);
+  CHECK(app == host.app.get());  // written back unchanged
+
+  // The add-in walked the add-ins by DISPID and found both.
+  // The add-ins are walked by DISPID from index 1 with 16-bit indexes: "VC++"
+  // is the first, "VisualStudio" the second.
+  std::vector<std::wstring> indexes;
+  for (const Seen& c : host.addIns->CallsOf(L"GetAt")) indexes.push_back(c.args.empty() ? L"" : c.args[0]);
+  CHECK(indexes == (std::vector<std::wstring>{L"i2:1", L"i2:1", L"i2:2"}));
+  // "VisualStudio" is switched off in the registry: text 5030 goes to the
+  // host's log (after the note that Developer Studio is missing) and the
+  // add-in is activated.
+  std::vector<Seen> logged = host.app->CallsOf(L"WriteErrorLog");
+  CHECK(!logged.empty());
+  if (!logged.empty()) CHECK(logged.back().args == std::vector<std::wstring>{L"bstr:" + Text(5030)});
+  CHECK_EQ(host.visualStudio->CallsOf(L"Activate").size(), 1u);
+  // Without Developer Studio the add-in switches itself off.
+  CHECK_EQ(host.ownAddIn->CallsOf(L"Deactivate").size(), 1u);
+  // Menu entries: item type, caption, internal name, in that order.
+  std::vector<Seen> menus = host.ownAddIn->CallsOf(L"AddContextMenuItem");
+  CHECK(menus.size() > 2);
+  if (menus.size() > 2)
+    CHECK(menus[1].args ==
+          (std::vector<std::wstring>{L"i2:4", L"bstr:" + Text(5001), L"bstr:CClass_ModelAssistant"}));
+
+  // QuarnApp hands back the very object the host gave.
+  Outcome quarnApp = Call(api.get(), 19, Flags::Get);
+  CHECK_EQ(quarnApp.result.v.vt, VT_DISPATCH);
+  CHECK(quarnApp.result.v.pdispVal == static_cast<IDispatch*>(host.app.get()));
+  quarnApp.result = Var();
+
+  // The debug log, switched on in the registry before the add-in loaded.
+  std::string log = ReadFileBytes(paths.Log());
+  CHECK(log.rfind(" TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n", 0) == 0);
+  if (log.rfind(" TRACE", 0) != 0) std::printf("  log: %s\n", log.substr(0, 200).c_str());
+
+  // By value works as well, and OnDeactivate lets the host go.
+  Var byValue = Var::Disp(host.app.get());
+  CHECK_HR(Call(api.get(), 21, Flags::Method, {&byValue}).hr, S_OK);
+  Outcome after = Call(api.get(), 19, Flags::Get);
+  CHECK(after.result.v.vt == VT_DISPATCH && after.result.v.pdispVal == nullptr);
+  app->Release();
+  byValue = Var();
+  CHECK_EQ(host.app->refs(), appRefs - 1);
+  CHECK(log.find("kpxAddin.OnDeactivate") == std::string::npos);  // read before it happened
+  CHECK(ReadFileBytes(paths.Log()).find(" TRACE    ADDIN     kpxAddin.OnDeactivate(QuarnApp)\r\n") != std::string::npos);
+
+  api.reset();
+  // The add-in holds nothing of the host once it is gone.
+  CHECK_EQ(host.app->refs(), 1L);
+  CHECK_EQ(host.menuEntry->refs(), 2L);  // the test's and the add-in's own member table
+}
+
+// ---------------------------------------------------------- errors to the host
+
+void ErrorsToTheHost() {
+  Group("a member's failure reaches the host as DISP_E_EXCEPTION with VB's number, or as E_NOTIMPL");
+  Host host;
+  Ref<IDispatch> api = Create(L"kpxAddIn.API");
+  CHECK(api);
+  if (!api) return;
+
+  Outcome none = Call(api.get(), 22, Flags::Method);  // OnAppInit()
+  CHECK_HR(none.hr, DISP_E_EXCEPTION);
+  CHECK_HR(none.info.scode, VbError(449));
+  CHECK_EQ(none.info.wCode, 0);
+  CHECK(none.Description() == L"Argument not optional");
+  CHECK(none.Source() == L"kpxAddIn");
+
+  Var app1 = Var::Disp(host.app.get()), app2 = Var::Disp(host.app.get());
+  Outcome two = Call(api.get(), 22, Flags::Method, {&app1, &app2});
+  CHECK_HR(two.hr, DISP_E_EXCEPTION);
+  CHECK_HR(two.info.scode, VbError(450));
+
+  Var text = Var::Str(L"not an object");
+  Outcome notObject = Call(api.get(), 22, Flags::Method, {&text});
+  CHECK_HR(notObject.hr, DISP_E_EXCEPTION);
+  CHECK_HR(notObject.info.scode, VbError(424));
+  CHECK(notObject.Description() == L"Object required");
+
+  // Without an EXCEPINFO the number comes back as the HRESULT, the text
+  // through IErrorInfo.
+  Outcome bare = Call(api.get(), 22, Flags::Method, {&text}, false);
+  CHECK_HR(bare.hr, VbError(424));
+  Ref<IErrorInfo> errorInfo;
+  CHECK_HR(GetErrorInfo(0, errorInfo.out()), S_OK);
+  if (errorInfo) {
+    BSTR description = nullptr;
+    errorInfo->GetDescription(&description);
+    CHECK(description && std::wstring(description) == L"Object required");
+    SysFreeString(description);
+  }
+
+  // A member whose behaviour is not there yet.
+  int notImplemented = 0;
+  std::span<const kpx::ApiMember> members = kpx::ApiMembers();
+  for (size_t i = 0; i < members.size(); ++i) {
+    if (members[i].call) continue;
+    std::vector<Var> args(members[i].paramCount);
+    std::vector<Var*> list;
+    for (Var& a : args) {
+      a = Var::Disp(host.app.get());
+      list.push_back(&a);
+    }
+    Outcome o = Call(api.get(), static_cast<DISPID>(i + 1), Flags::MethodOrGet, list);
+    CHECK_HR(o.hr, E_NOTIMPL);
+    if (o.hr != E_NOTIMPL) std::printf("  member %s\n", members[i].name);
+    ++notImplemented;
+  }
+  std::printf("  %d members answer E_NOTIMPL\n", notImplemented);
+
+  // A member without a trap lets the host's own 438 through: the host
+  // application here has no CurrentModel.
+  Var appRef = Var::Disp(host.app.get());
+  short itemType = 4;
+  Var type = Var::RefI2(&itemType);
+  Outcome menus = Call(api.get(), 2, Flags::Method, {&appRef, &type});
+  CHECK_HR(menus.hr, DISP_E_EXCEPTION);
+  CHECK_HR(menus.info.scode, VbError(438));
+  CHECK(menus.Description() == L"Object doesn't support this property or method");
+
+  Group("by-reference arguments are written back into the caller's typed references");
+  Ref<HostObject> module = HostObject::Make(L"module");
+  module->Text(12668, L"IdentifyClass", L"Module").Text(12566, L"Language", L"Java");
+  IDispatch* item = module.get();
+  item->AddRef();
+  short count = 99;
+  VARIANT_BOOL hasVC = VARIANT_TRUE;
+  VARIANT_BOOL failed = VARIANT_TRUE;
+  Var itemArg = Var::RefDisp(&item), countArg = Var::RefI2(&count), hasArg = Var::RefBool(&hasVC),
+      failedArg = Var::RefBool(&failed);
+  Outcome validated = Call(api.get(), 3, Flags::Method, {&itemArg, &countArg, &hasArg, &failedArg});
+  CHECK_HR(validated.hr, S_OK);
+  CHECK_EQ(count, 1);  // one component, judged by itself
+  CHECK_EQ(hasVC, VARIANT_FALSE);
+  CHECK_EQ(failed, VARIANT_FALSE);
+  CHECK(item == module.get());
+  CHECK_EQ(countArg.v.vt, VT_BYREF | VT_I2);  // the caller's reference keeps its type
+  item->Release();
+
+  // Through a VARIANT reference the member's own type comes back.
+  VARIANT countVariant;
+  VariantInit(&countVariant);
+  countVariant.vt = VT_I4;
+  countVariant.lVal = 7;
+  Var item2 = Var::Disp(module.get()), countRef = Var::RefVariant(&countVariant), has2 = Var::Bool(true),
+      failed2 = Var::Bool(true);
+  CHECK_HR(Call(api.get(), 3, Flags::Method, {&item2, &countRef, &has2, &failed2}).hr, S_OK);
+  CHECK_EQ(countVariant.vt, VT_I2);
+  CHECK_EQ(countVariant.iVal, 1);
+  module->Clear();
+}
+
+// ------------------------------------------------------------ TokenScanner
+
+void TokenScannerThroughIDispatch() {
+  Group("kpxAddIn.TokenScanner through IDispatch: argument order, strings, properties, delimiters");
+  HRESULT hr = E_FAIL;
+  Ref<IDispatch> scanner = Create(L"kpxAddIn.TokenScanner", &hr);
+  CHECK_HR(hr, S_OK);
+  if (!scanner) return;
+  const DISPID init = IdOf(scanner.get(), L"Init");
+  const DISPID next = IdOf(scanner.get(), L"NextToken");
+  CHECK(init != DISPID_UNKNOWN && next != DISPID_UNKNOWN);
+
+  Var text = Var::Str(L"a,,b"), delimiters = Var::Str(L"|,");
+  Outcome ok = Call(scanner.get(), init, Flags::Method, {&text, &delimiters});
+  CHECK_EQ(ok.result.v.vt, VT_BOOL);
+  CHECK_EQ(ok.result.v.boolVal, VARIANT_TRUE);
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"a");
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"b");
+  Outcome end = Call(scanner.get(), next, Flags::Method);
+  CHECK(end.result.v.vt == VT_BSTR && end.result.Text().empty());
+
+  // Text beyond ASCII survives the round trip.
+  Var wide = Var::Str(L"\u00e4\u00f6;\u20ac"), semicolon = Var::Str(L"|;");
+  Call(scanner.get(), init, Flags::Method, {&wide, &semicolon});
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"\u00e4\u00f6");
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"\u20ac");
+
+  // An empty delimiter list is refused.
+  Var empty = Var::Str(L"");
+  CHECK_EQ(Call(scanner.get(), init, Flags::Method, {&text, &empty}).result.v.boolVal, VARIANT_FALSE);
+
+  // ScanString is written with the named put argument, and replacing a token
+  // keeps the delimiters around it.
+  const DISPID scan = IdOf(scanner.get(), L"ScanString");
+  Var abc = Var::Str(L"a,b,c");
+  CHECK_HR(Call(scanner.get(), scan, Flags::Put, {&abc}).hr, S_OK);
+  CHECK(Call(scanner.get(), scan, Flags::Get).result.Text() == L"a,b,c");
+  Var comma = Var::Str(L"|,");
+  Call(scanner.get(), init, Flags::Method, {&abc, &comma});
+  Call(scanner.get(), next, Flags::Method);
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"b");
+  Var xx = Var::Str(L"xx");
+  CHECK_EQ(Call(scanner.get(), IdOf(scanner.get(), L"ReplaceCurrentToken"), Flags::Method, {&xx}).result.v.boolVal,
+           VARIANT_TRUE);
+  CHECK(Call(scanner.get(), scan, Flags::Get).result.Text() == L"a,xx,c");
+  CHECK(Call(scanner.get(), IdOf(scanner.get(), L"CurrentToken"), Flags::Get).result.Text() == L"b");
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"c");
+
+  // The delimiter set: a live keyed collection.
+  const DISPID delimitors = IdOf(scanner.get(), L"Delimitors");
+  Outcome set = Call(scanner.get(), delimitors, Flags::Get);
+  CHECK_EQ(set.result.v.vt, VT_DISPATCH);
+  if (set.result.v.vt != VT_DISPATCH || !set.result.v.pdispVal) return;
+  IDispatch* keys = set.result.v.pdispVal;
+  CHECK_EQ(Call(keys, IdOf(keys, L"Count"), Flags::Get).result.v.lVal, 1L);
+  Var commaKey = Var::Str(L","), semiKey = Var::Str(L";");
+  CHECK_EQ(Call(keys, IdOf(keys, L"Exists"), Flags::Method, {&commaKey}).result.v.boolVal, VARIANT_TRUE);
+  CHECK_HR(Call(keys, IdOf(keys, L"Add"), Flags::Method, {&semiKey}).hr, S_OK);
+  Outcome duplicate = Call(keys, IdOf(keys, L"Add"), Flags::Method, {&semiKey});
+  CHECK_HR(duplicate.info.scode, VbError(457));
+  Var mixed = Var::Str(L"p;q,r");
+  Call(scanner.get(), scan, Flags::Put, {&mixed});
+  // Init would replace the set; rescanning from a fresh ScanString goes on
+  // from the old position, so a second scanner checks the new set instead.
+  Ref<IDispatch> other = Create(L"kpxAddIn.TokenScanner");
+  CHECK(other);
+  if (other) {
+    Var setArg = Var::Disp(keys);
+    CHECK_HR(Call(other.get(), delimitors, Flags::PutRef, {&setArg}).hr, S_OK);
+    Var pqr = Var::Str(L"p;q,r");
+    CHECK_HR(Call(other.get(), scan, Flags::Put, {&pqr}).hr, S_OK);
+    CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"p");
+    CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"q");
+    // A foreign object is no delimiter set.
+    Ref<HostObject> foreign = HostObject::Make(L"dictionary");
+    Var foreignArg = Var::Disp(foreign.get());
+    Outcome refused = Call(other.get(), delimitors, Flags::PutRef, {&foreignArg});
+    CHECK_HR(refused.hr, DISP_E_EXCEPTION);
+    CHECK_HR(refused.info.scode, VbError(13));
+  }
+}
+
+// --------------------------------------------------- the bridge, directly
+
+// An object of the test host's own, to send out and get back.
+class Echo final : public kpx::Object {
+ public:
+  kpx::DispId IdOfName(std::string_view) override { throw kpx::AutomationError(kpx::vberr::kNoSuchMember); }
+  kpx::Variant Invoke(kpx::DispId, kpx::CallKind, std::span<kpx::Variant> args) override {
+    return args.empty() ? kpx::Variant() : args[0];
+  }
+};
+
+int32_t ErrorNumber(const std::function<void()>& f, std::string* description = nullptr) {
+  try {
+    f();
+  } catch (const kpx::AutomationError& e) {
+    if (description) *description = e.description();
+    return e.number();
+  }
+  return 0;
+}
+
+void BridgeAgainstHostObjects() {
+  Group("host objects through the adapter: argument order, references, put, errors, value kinds");
+  kpx::win32::ServerLocks locks;
+  {
+    kpx::win32::ComBridge bridge(locks);
+    Ref<HostObject> host = HostObject::Make(L"host");
+    host->Method(10, L"Three");
+    host->On(11, L"Bump", [](DISPPARAMS& p, VARIANT*, EXCEPINFO*) {
+      VARIANT& a = Arg(p, 0);
+      if (a.vt != (VT_BYREF | VT_VARIANT)) return DISP_E_TYPEMISMATCH;
+      VariantClear(a.pvarVal);
+      a.pvarVal->vt = VT_I4;
+      a.pvarVal->lVal = 42;
+      return S_OK;
+    });
+    host->On(12, L"FailWCode", [](DISPPARAMS&, VARIANT*, EXCEPINFO* info) {
+      info->wCode = 1234;
+      info->bstrDescription = SysAllocString(L"Custom failure");
+      info->bstrSource = SysAllocString(L"host");
+      return DISP_E_EXCEPTION;
+    });
+    host->On(13, L"FailScode", [](DISPPARAMS&, VARIANT*, EXCEPINFO* info) {
+      info->scode = VbError(5);
+      return DISP_E_EXCEPTION;
+    });
+    host->On(14, L"FailPlain", [](DISPPARAMS&, VARIANT*, EXCEPINFO*) { return E_INVALIDARG; });
+    host->Method(15, L"Prop");
+    host->On(16, L"Echo", [](DISPPARAMS& p, VARIANT* result, EXCEPINFO*) {
+      return p.cArgs == 1 ? VariantCopyInd(result, &Arg(p, 0)) : DISP_E_BADPARAMCOUNT;
+    });
+
+    kpx::ObjectPtr object = bridge.Adopt(host.get());
+    kpx::CallMethod(object, 10, {kpx::Variant(int16_t{7}), kpx::Variant("x"), kpx::Variant(true)});
+    CHECK(host->CallsOf(L"Three").at(0).args == (std::vector<std::wstring>{L"i2:7", L"bstr:x", L"bool:-1"}));
+    CHECK_EQ(host->CallsOf(L"Three").at(0).flags, DISPATCH_METHOD | DISPATCH_PROPERTYGET);
+
+    kpx::Variant bumped(int16_t{1});
+    kpx::CallMethod(object, 11, {kpx::Variant::Ref(&bumped)});
+    CHECK(bumped == kpx::Variant(int32_t{42}));
+
+    CHECK_EQ(ErrorNumber([&] { kpx::CallMethod(object, 999); }), kpx::vberr::kNoSuchMember);
+    CHECK_EQ(ErrorNumber([&] { kpx::CallByName(object, "Nope", kpx::CallKind::Method); }), kpx::vberr::kNoSuchMember);
+    CHECK_EQ(object->IdOfName("bump"), 11);
+    std::string description;
+    CHECK_EQ(ErrorNumber([&] { kpx::CallMethod(object, 12); }, &description), 1234);
+    CHECK_EQ(description, std::string("Custom failure"));
+    CHECK_EQ(ErrorNumber([&] { kpx::CallMethod(object, 13); }, &description), 5);
+    CHECK_EQ(description, std::string("Invalid procedure call or argument"));
+    CHECK_EQ(ErrorNumber([&] { kpx::CallMethod(object, 14); }, &description), static_cast<int32_t>(E_INVALIDARG));
+    CHECK(!description.empty());
+
+    kpx::PutProperty(object, 15, kpx::Variant("v"));
+    Seen put = host->CallsOf(L"Prop").at(0);
+    CHECK_EQ(put.flags, DISPATCH_PROPERTYPUT);
+    CHECK(put.named == std::vector<DISPID>{DISPID_PROPERTYPUT});
+    CHECK(put.args == std::vector<std::wstring>{L"bstr:v"});
+
+    const kpx::Variant kinds[] = {kpx::Variant(),
+                                  kpx::Variant::Null(),
+                                  kpx::Variant(false),
+                                  kpx::Variant(true),
+                                  kpx::Variant(int16_t{-2}),
+                                  kpx::Variant(int32_t{70000}),
+                                  kpx::Variant(1.5f),
+                                  kpx::Variant(2.25),
+                                  kpx::Variant::Date(45000.5),
+                                  kpx::Variant("Gr\xC3\xBC\xC3\x9F" "e \xE2\x82\xAC \xF0\x9F\x98\x80"),
+                                  kpx::Variant(""),
+                                  kpx::Variant::Nothing()};
+    for (const kpx::Variant& v : kinds) {
+      kpx::Variant back = kpx::CallMethod(object, 16, {v});
+      CHECK(back == v);
+      if (!(back == v)) std::printf("  kind %s came back as %s\n", kpx::VarTypeName(v.type()), kpx::VarTypeName(back.type()));
+    }
+    // An object of ours goes out as IDispatch and comes back as itself.
+    auto echo = std::make_shared<Echo>();
+    kpx::Variant back = kpx::CallMethod(object, 16, {kpx::Variant(kpx::ObjectPtr(echo))});
+    CHECK(back.objectOrNull().get() == echo.get());
+    // A foreign object goes back out as its own pointer.
+    kpx::CallMethod(object, 10, {kpx::Variant(object)});
+    CHECK(host->CallsOf(L"Three").back().args == std::vector<std::wstring>{L"disp"});
+    host->Clear();
+  }
+  CHECK_EQ(locks.objects, 0L);
+}
+
+void PlatformOverWin32(const Paths& paths) {
+  Group("the Win32 platform: resource component early- and late-bound, object creation, registry, files");
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32Platform win32(bridge);
+  kpx::platform::Platform world = win32.platform();
+
+  kpx::ObjectPtr resource = world.objects.CreateInstance(kpx::kResourceClassId, kpx::kResourceInterfaceId);
+  CHECK(dynamic_cast<kpx::win32::EarlyBoundResourceObject*>(resource.get()) != nullptr);
+  CHECK_EQ(kpx::CallOwnOperation(resource, 1, kpx::CallKind::Method, {kpx::Variant(int32_t{5001})}).toString(),
+           std::string(kpx::FindResourceText(5001)));
+  std::string description;
+  CHECK_EQ(ErrorNumber([&] { kpx::CallOwnOperation(resource, 1, kpx::CallKind::Method, {kpx::Variant(int32_t{4242})}); },
+                       &description),
+           326);
+  CHECK(description.find("4242") != std::string::npos);
+
+  kpx::ObjectPtr late = world.objects.CreateObject(kpx::kResourceProgId);
+  kpx::Variant id(int32_t{5002});
+  CHECK_EQ(kpx::CallByName(late, "GetString", kpx::CallKind::Method, {kpx::Variant::Ref(&id)}).toString(),
+           std::string(kpx::FindResourceText(5002)));
+  CHECK(id == kpx::Variant(int32_t{5002}));
+  kpx::Variant missing(int32_t{4243});
+  CHECK_EQ(ErrorNumber([&] { kpx::CallByName(late, "GetString", kpx::CallKind::Method, {kpx::Variant::Ref(&missing)}); },
+                       &description),
+           326);
+  // Own operations by position, found through the dual interface's vtable.
+  CHECK_EQ(late->IdOfOwnOperation(1), 1);
+  CHECK_EQ(late->IdOfOwnOperation(2), 2);
+  CHECK_EQ(ErrorNumber([&] { late->IdOfOwnOperation(3); }), kpx::vberr::kNoSuchMember);
+
+  CHECK_EQ(ErrorNumber([&] { world.objects.CreateObject("kpx.NoSuchComponent"); }, &description),
+           kpx::vberr::kCantCreateObject);
+  CHECK(!description.empty());
+  CHECK_EQ(ErrorNumber([&] { world.objects.CreateInstance("{00000000-0000-0000-0000-00000000ABCD}",
+                                                         kpx::kResourceInterfaceId); }),
+           kpx::vberr::kCantCreateObject);
+
+  // Registry, through the core's own routines over the ANSI functions.
+  const char* key = "Software\\kpxtest";
+  CHECK(world.registry.CreateKey(kpx::platform::RootKey::CurrentUser, key) != kpx::platform::KeyDisposition::Failed);
+  kpx::RegistrySetValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "text", kpx::Variant("Gr\xC3\xBC\xC3\x9F" "e"),
+                        kpx::platform::kRegSz);
+  CHECK(kpx::RegistryQueryValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "text") ==
+        kpx::Variant("Gr\xC3\xBC\xC3\x9F" "e"));
+  std::optional<kpx::platform::RegistryValue> raw =
+      world.registry.QueryValue(kpx::platform::RootKey::CurrentUser, key, "text");
+  CHECK(raw && raw->type == kpx::platform::kRegSz && raw->data.size() == 6 && raw->data.back() == '\0');
+  kpx::RegistrySetValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "number", kpx::Variant(int32_t{-5}),
+                        kpx::platform::kRegDword);
+  CHECK(kpx::RegistryQueryValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "number") ==
+        kpx::Variant(int32_t{-5}));
+  // Writing under a missing key creates nothing.
+  CHECK(!world.registry.SetValue(kpx::platform::RootKey::CurrentUser, "Software\\kpxtest\\missing", "x",
+                                 {kpx::platform::kRegSz, std::string("y\0", 2)}));
+  CHECK(kpx::RegistryQueryValue(world.registry, kpx::platform::RootKey::CurrentUser, "Software\\kpxtest\\missing", "x")
+            .isEmpty());
+  RegDeleteTreeA(HKEY_CURRENT_USER, key);
+  RegDeleteKeyA(HKEY_CURRENT_USER, key);
+
+  // Files: appended in the ANSI code page, created when missing.
+  const std::string file = Narrow(paths.scratch) + "\\append.txt";
+  world.files.DeleteFile(file);
+  CHECK(!world.files.Exists(file));
+  CHECK(world.files.AppendText(file, "one\r\n"));
+  CHECK(world.files.AppendText(file, "t\xC3\xA9st\r\n"));
+  CHECK(world.files.Exists(file));
+  CHECK_EQ(ReadFileBytes(Widen(file)), std::string("one\r\nt\xE9st\r\n"));
+  CHECK(world.files.DeleteFile(file));
+  CHECK(!world.files.DeleteFile(file));
+  CHECK(!world.files.AppendText(Narrow(paths.scratch) + "\\no such folder\\x.txt", "x"));
+
+  const float timer = world.clock.Timer();
+  CHECK(timer >= 0.0f && timer < 86400.0f);
+  CHECK(world.clock.Now().year >= 2000);
+}
+
+// --------------------------------------------------------- unloading
+
+using CanUnloadNow = HRESULT(STDAPICALLTYPE*)();
+
+void ReferencesAndUnloading(HMODULE addin) {
+  Group("no leaked references: DllCanUnloadNow answers S_OK once everything is released");
+  auto canUnload = reinterpret_cast<CanUnloadNow>(reinterpret_cast<void*>(GetProcAddress(addin, "DllCanUnloadNow")));
+  CHECK(canUnload != nullptr);
+  if (!canUnload) return;
+  {
+    Ref<IDispatch> api = Create(L"kpxAddIn.API");
+    Ref<IDispatch> scanner = Create(L"kpxAddIn.TokenScanner");
+    CHECK(api && scanner);
+    CHECK_HR(canUnload(), S_FALSE);
+    Outcome set = Call(scanner.get(), IdOf(scanner.get(), L"Delimitors"), Flags::Get);
+    api.reset();
+    scanner.reset();
+    CHECK_HR(canUnload(), S_FALSE);  // the delimiter set is still held
+  }
+  CoFreeUnusedLibraries();
+  CHECK_HR(canUnload(), S_OK);
+
+  Ref<IClassFactory> factory;
+  CHECK_HR(CoGetClassObject(CLSID_API, CLSCTX_INPROC_SERVER, nullptr, IID_IClassFactory,
+                            reinterpret_cast<void**>(factory.out())),
+           S_OK);
+  if (factory) {
+    factory->LockServer(TRUE);
+    CHECK_HR(canUnload(), S_FALSE);
+    factory->LockServer(FALSE);
+    CHECK_HR(canUnload(), S_OK);
+  }
+}
+
+void ResourceComponentMissing(const Paths& paths) {
+  Group("without kpxres registered the add-in cannot be created, cleanly; registered again it can");
+  CHECK_EQ(Regsvr32(paths.res, true), 0ul);
+  HRESULT hr = S_OK;
+  Ref<IDispatch> api = Create(L"kpxAddIn.API", &hr);
+  CHECK(!api);
+  CHECK_HR(hr, VbError(429));
+  Ref<IErrorInfo> info;
+  if (GetErrorInfo(0, info.out()) == S_OK && info) {
+    BSTR text = nullptr;
+    info->GetDescription(&text);
+    CHECK(text && SysStringLen(text) > 0);
+    SysFreeString(text);
+  }
+  // The token scanner needs no resources.
+  CHECK(Create(L"kpxAddIn.TokenScanner"));
+  CHECK_EQ(Regsvr32(paths.res, false), 0ul);
+  api = Create(L"kpxAddIn.API", &hr);
+  CHECK_HR(hr, S_OK);
+}
+
+}  // namespace
+}  // namespace wintest
+
+int main(int argc, char** argv) {
+  using namespace wintest;
+  if (argc != 4) {
+    std::fprintf(stderr, "usage: kpx-wintest <kpxaddin.dll> <kpxres.dll> <scratch folder>\n");
+    return 2;
+  }
+  Paths paths{Widen(argv[1]), Widen(argv[2]), Widen(argv[3])};
+  CreateDirectoryW(paths.scratch.c_str(), nullptr);
+  DeleteFileW(paths.Log().c_str());
+  std::printf("kpx-wintest: %s build\n", sizeof(void*) == 8 ? "x64" : "x86");
+
+  RegistrationRoundTrip(paths);
+
+  // Logging on for everything of the add-in, without time stamps, and the
+  // "VisualStudio" add-in switched off; read once, when the add-in loads.
+  CHECK(WriteAnsiDword(HKEY_LOCAL_MACHINE, kHostKey, "Debug", 0x7F000080));
+  CHECK(WriteAnsiString(HKEY_LOCAL_MACHINE, kHostKey, "DebugOutputFile", Narrow(paths.Log()).c_str()));
+  CHECK(WriteAnsiString(HKEY_LOCAL_MACHINE, kHostKey, "SuppressTimeStamps", "true"));
+  CHECK(WriteAnsiString(HKEY_CURRENT_USER, kHostKey, "Active", "No"));
+
+  CoInitialize(nullptr);
+  HMODULE addin = LoadLibraryW(paths.addin.c_str());  // kept mapped to ask DllCanUnloadNow
+  CHECK(addin != nullptr);
+
+  CreationAndTypeInformation();
+  Activation(paths);
+  ErrorsToTheHost();
+  TokenScannerThroughIDispatch();
+  BridgeAgainstHostObjects();
+  PlatformOverWin32(paths);
+  if (addin) ReferencesAndUnloading(addin);
+  ResourceComponentMissing(paths);
+
+  CoFreeUnusedLibraries();
+  CoUninitialize();
+  if (addin) FreeLibrary(addin);
+
+  const Tally& t = tally();
+  std::printf("%d checks, %d failed\n", t.checks, t.failed);
+  return t.failed == 0 ? 0 : 1;
+}
