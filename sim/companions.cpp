@@ -25,15 +25,15 @@ bool IsKeep(const InputJson& j) { return j.is_object() && j.size() == 1 && j.con
 
 // ----------------------------------------------------------- CompanionObject
 
-CompanionObject::CompanionObject(World& world, std::shared_ptr<const CompanionSpec> spec, std::string label)
-    : world_(world), spec_(std::move(spec)), label_(std::move(label)) {
+CompanionObject::CompanionObject(World& world, std::shared_ptr<const CompanionDef> def, std::string label)
+    : world_(world), def_(std::move(def)), label_(std::move(label)) {
   auto add = [&](const std::string& name) {
     for (const std::string& n : names_)
       if (EqualsNoCase(n, name)) return;
     names_.push_back(name);
   };
-  for (const std::string& op : spec_->operations) add(op);
-  for (const auto& [name, member] : spec_->members) add(name);
+  for (const std::string& op : def_->operations) add(op);
+  for (const auto& [name, member] : def_->members) add(name);
 }
 
 void CompanionObject::RecordFailure(EventJson call, const AutomationError& error) {
@@ -50,8 +50,8 @@ DispId CompanionObject::IdOfName(std::string_view name) {
 }
 
 DispId CompanionObject::IdOfOwnOperation(int position) {
-  if (position >= 1 && static_cast<size_t>(position) <= spec_->operations.size())
-    return IdOfName(spec_->operations[static_cast<size_t>(position - 1)]);
+  if (position >= 1 && static_cast<size_t>(position) <= def_->operations.size())
+    return IdOfName(def_->operations[static_cast<size_t>(position - 1)]);
   const AutomationError error(vberr::kNoSuchMember);
   RecordFailure({{"ev", "companion-call"}, {"instance", label_}, {"operation", position}}, error);
   throw error;
@@ -63,8 +63,8 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
   EventLog& log = world_.log();
 
   EventJson call{{"ev", "companion-call"}, {"instance", label_}, {"member", name}, {"kind", KindName(kind)}};
-  for (size_t i = 0; i < spec_->operations.size(); ++i)
-    if (EqualsNoCase(spec_->operations[i], name)) {
+  for (size_t i = 0; i < def_->operations.size(); ++i)
+    if (EqualsNoCase(def_->operations[i], name)) {
       call["operation"] = i + 1;
       break;
     }
@@ -73,7 +73,7 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
     shown.push_back(a.isByRef() ? EventJson{{"byref", log.Value(a)}} : log.Value(a));
   call["args"] = std::move(shown);
 
-  const MemberSpec* member = spec_->FindMember(name);
+  const MemberDef* member = def_->FindMember(name);
   if (!member) {
     const AutomationError error(vberr::kNoSuchMember);
     RecordFailure(std::move(call), error);
@@ -101,13 +101,13 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
 
 ObjectPtr CompanionObject::SubObject(const std::string& name) {
   ObjectPtr& slot = objects_[name];
-  if (!slot) slot = std::make_shared<CompanionObject>(world_, spec_->objects.at(name), label_ + "." + name);
+  if (!slot) slot = std::make_shared<CompanionObject>(world_, def_->objects.at(name), label_ + "." + name);
   return slot;
 }
 
-ObjectPtr CompanionObject::ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionSpec>& spec) {
+ObjectPtr CompanionObject::ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionDef>& def) {
   ObjectPtr& slot = objects_["()" + member];  // apart from the named objects
-  if (!slot) slot = std::make_shared<CompanionObject>(world_, spec, label_ + "." + member);
+  if (!slot) slot = std::make_shared<CompanionObject>(world_, def, label_ + "." + member);
   return slot;
 }
 
@@ -139,29 +139,29 @@ std::string ResourceObject::Text(int32_t id) const {
 // ---------------------------------------------------------- SimObjectFactory
 
 ObjectPtr SimObjectFactory::MakeResource() {
-  if (!world_.spec().resourceRegistered) throw AutomationError(vberr::kCantCreateObject);
+  if (!world_.def().resourceRegistered) throw AutomationError(vberr::kCantCreateObject);
   const std::string base(kResourceProgId);
   return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)),
-                                          world_.spec().resources);
+                                          world_.def().resources);
 }
 
-ObjectPtr SimObjectFactory::MakeCompanion(const std::shared_ptr<const CompanionSpec>& spec) {
-  if (spec->createError) throw AutomationError(spec->createError->number, spec->createError->description);
-  const std::string base = spec->progid.empty() ? spec->clsid : spec->progid;
-  return std::make_shared<CompanionObject>(world_, spec, base + "#" + std::to_string(world_.NextInstance(base)));
+ObjectPtr SimObjectFactory::MakeCompanion(const std::shared_ptr<const CompanionDef>& def) {
+  if (def->createError) throw AutomationError(def->createError->number, def->createError->description);
+  const std::string base = def->progid.empty() ? def->clsid : def->progid;
+  return std::make_shared<CompanionObject>(world_, def, base + "#" + std::to_string(world_.NextInstance(base)));
 }
 
 ObjectPtr SimObjectFactory::CreateObject(std::string_view progId) {
   if (EqualsNoCase(progId, kResourceProgId)) return MakeResource();
-  for (const auto& spec : world_.spec().companions)
-    if (!spec->progid.empty() && EqualsNoCase(spec->progid, progId)) return MakeCompanion(spec);
+  for (const auto& def : world_.def().companions)
+    if (!def->progid.empty() && EqualsNoCase(def->progid, progId)) return MakeCompanion(def);
   throw AutomationError(vberr::kCantCreateObject);
 }
 
 ObjectPtr SimObjectFactory::CreateInstance(std::string_view clsid, std::string_view) {
   if (EqualsNoCase(clsid, kResourceClassId)) return MakeResource();
-  for (const auto& spec : world_.spec().companions)
-    if (!spec->clsid.empty() && EqualsNoCase(spec->clsid, clsid)) return MakeCompanion(spec);
+  for (const auto& def : world_.def().companions)
+    if (!def->clsid.empty() && EqualsNoCase(def->clsid, clsid)) return MakeCompanion(def);
   throw AutomationError(vberr::kCantCreateObject);
 }
 

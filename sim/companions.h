@@ -19,25 +19,25 @@ namespace kpx::sim {
 class World;
 
 // A scripted companion: its members answer, raise and write back arguments
-// as its spec says; a member the spec does not list raises 438.
+// as the model file describes it; a member it does not list raises 438.
 class CompanionObject final : public SimObject {
  public:
-  CompanionObject(World& world, std::shared_ptr<const CompanionSpec> spec, std::string label);
+  CompanionObject(World& world, std::shared_ptr<const CompanionDef> def, std::string label);
   std::string label() const override { return label_; }
 
   DispId IdOfName(std::string_view name) override;
   DispId IdOfOwnOperation(int position) override;
   Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
 
-  // One of the spec's named objects, made on first use and kept.
+  // One of its named sub-objects, made on first use and kept.
   ObjectPtr SubObject(const std::string& name);
 
  private:
-  ObjectPtr ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionSpec>& spec);
+  ObjectPtr ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionDef>& def);
   void RecordFailure(EventJson call, const AutomationError& error);
 
   World& world_;
-  std::shared_ptr<const CompanionSpec> spec_;
+  std::shared_ptr<const CompanionDef> def_;
   std::string label_;
   std::vector<std::string> names_;  // DISPID = position + 1: own operations first
   std::map<std::string, ObjectPtr> objects_;
@@ -72,7 +72,7 @@ class SimObjectFactory final : public platform::ObjectFactory {
 
  private:
   ObjectPtr MakeResource();
-  ObjectPtr MakeCompanion(const std::shared_ptr<const CompanionSpec>& spec);
+  ObjectPtr MakeCompanion(const std::shared_ptr<const CompanionDef>& def);
   World& world_;
 };
 

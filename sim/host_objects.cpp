@@ -132,10 +132,10 @@ Variant MenuEntryObject::Call(DispId, CallKind kind, std::span<Variant> args) {
 
 // --------------------------------------------------------------- AddInObject
 
-AddInObject::AddInObject(World& world, const AddInSpec& spec)
-    : HostObject(world), spec_(spec), settings_(spec.settings) {
-  if (spec.eventHandler)
-    eventHandler_ = std::make_shared<CompanionObject>(world, spec.eventHandler, label() + ".EventHandler");
+AddInObject::AddInObject(World& world, const AddInDef& def)
+    : HostObject(world), def_(def), settings_(def.settings) {
+  if (def.eventHandler)
+    eventHandler_ = std::make_shared<CompanionObject>(world, def.eventHandler, label() + ".EventHandler");
 }
 
 std::span<const MemberName> AddInObject::Names() const {
@@ -152,7 +152,7 @@ std::span<const MemberName> AddInObject::Names() const {
       {id::kEventHandler, simid::kEventHandler},
       {"AddContextMenuItem", id::kAddContextMenuItem},
   };
-  return std::span<const MemberName>(kNames, spec_.contextMenus ? std::size(kNames) : std::size(kNames) - 1);
+  return std::span<const MemberName>(kNames, def_.contextMenus ? std::size(kNames) : std::size(kNames) - 1);
 }
 
 Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
@@ -160,11 +160,11 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
   switch (dispId) {
     case id::kAddInName:
       Read(kind, args);
-      return spec_.name;
+      return def_.name;
     case id::kActivate:
     case id::kDeactivate:
       Read(kind, args);
-      log.Add({{"ev", "addin"}, {"addin", spec_.id}, {"action", dispId == id::kActivate ? "Activate" : "Deactivate"}});
+      log.Add({{"ev", "addin"}, {"addin", def_.id}, {"action", dispId == id::kActivate ? "Activate" : "Deactivate"}});
       return {};
     case id::kReadSetting: {
       Read(kind, args, 2, 3);
@@ -176,7 +176,7 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
           value = e->second;
           found = true;
         }
-      log.Add({{"ev", "setting-read"}, {"addin", spec_.id}, {"section", section}, {"entry", entry},
+      log.Add({{"ev", "setting-read"}, {"addin", def_.id}, {"section", section}, {"entry", entry},
                {"value", value}, {"found", found}});
       return value;
     }
@@ -184,28 +184,28 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
       Read(kind, args, 3);
       const std::string section = args[0].toString(), entry = args[1].toString(), value = args[2].toString();
       settings_[section][entry] = value;
-      log.Add({{"ev", "setting-write"}, {"addin", spec_.id}, {"section", section}, {"entry", entry}, {"value", value}});
+      log.Add({{"ev", "setting-write"}, {"addin", def_.id}, {"section", section}, {"entry", entry}, {"value", value}});
       return true;
     }
     case id::kAddContextMenuItem: {
       Read(kind, args, 3);
       const int16_t itemType = args[0].toInt16();
       const std::string caption = args[1].toString(), name = args[2].toString();
-      log.Add({{"ev", "menu-add"}, {"addin", spec_.id}, {"itemType", itemType}, {"caption", caption}, {"name", name}});
+      log.Add({{"ev", "menu-add"}, {"addin", def_.id}, {"itemType", itemType}, {"caption", caption}, {"name", name}});
       Variant state;
-      if (auto s = spec_.menuStates.find(name); s != spec_.menuStates.end()) state = world_.ToVariant(s->second);
+      if (auto s = def_.menuStates.find(name); s != def_.menuStates.end()) state = world_.ToVariant(s->second);
       return ObjectPtr(std::make_shared<MenuEntryObject>(world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)),
-                                                         spec_.id, name, state));
+                                                         def_.id, name, state));
     }
     case id::kHelpFile:
       Read(kind, args);
-      return spec_.helpFile;
+      return def_.helpFile;
     case id::kInstallDirectory:
       Read(kind, args);
-      return spec_.installDirectory;
+      return def_.installDirectory;
     case id::kRegistryRoot:
       Read(kind, args);
-      return spec_.registryRoot;
+      return def_.registryRoot;
     case simid::kEventHandler:
       Read(kind, args);
       return eventHandler_;
@@ -228,9 +228,9 @@ Variant AddInManagerObject::Call(DispId, CallKind kind, std::span<Variant> args)
 
 // --------------------------------------------------------- ApplicationObject
 
-ApplicationObject::ApplicationObject(World& world, const ApplicationSpec& spec, ObjectPtr manager)
-    : HostObject(world), spec_(spec), manager_(std::move(manager)),
-      window_{spec.top, spec.left, spec.height, spec.width} {}
+ApplicationObject::ApplicationObject(World& world, const ApplicationDef& def, ObjectPtr manager)
+    : HostObject(world), def_(def), manager_(std::move(manager)),
+      window_{def.top, def.left, def.height, def.width} {}
 
 std::span<const MemberName> ApplicationObject::Names() const {
   static constexpr MemberName kNames[] = {
@@ -256,13 +256,13 @@ Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant>
     }
     case id::kApplicationPath:
       Read(kind, args);
-      return spec_.path;
+      return def_.path;
     case id::kExecuteScript: {
       Read(kind, args, 1);
       const std::string path = args[0].toString();
       EventJson ev{{"ev", "script"}, {"path", path}};
-      auto failing = spec_.failingScripts.find(path);
-      if (failing == spec_.failingScripts.end()) {
+      auto failing = def_.failingScripts.find(path);
+      if (failing == def_.failingScripts.end()) {
         log.Add(std::move(ev));
         return {};
       }
@@ -291,7 +291,7 @@ Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant>
     }
     case simid::kGetMainWnd:
       Read(kind, args);
-      return spec_.mainWindow;
+      return def_.mainWindow;
     default:
       NoMember();
   }
@@ -311,7 +311,7 @@ Variant ModelObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
     return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:selection", world_.SelectedItems(), true));
   }
   Read(kind, args, 2);
-  return LookUp(world_.spec().modelProperties, args[0].toString(), args[1].toString()).value_or("");
+  return LookUp(world_.def().modelProperties, args[0].toString(), args[1].toString()).value_or("");
 }
 
 // ------------------------------------------------------------- ElementObject
@@ -389,10 +389,10 @@ std::string_view RelatedKind(int32_t n) {
 
 }  // namespace
 
-ElementObject::ElementObject(World& world, const ElementSpec& spec)
-    : HostObject(world), spec_(spec), name_(spec.name), stereotype_(spec.stereotype), properties_(spec.properties) {}
+ElementObject::ElementObject(World& world, const ElementDef& def)
+    : HostObject(world), def_(def), name_(def.name), stereotype_(def.stereotype), properties_(def.properties) {}
 
-std::span<const MemberName> ElementObject::Names() const { return NamesFor(spec_.kind); }
+std::span<const MemberName> ElementObject::Names() const { return NamesFor(def_.kind); }
 
 ObjectPtr ElementObject::Ref(const std::string& key) const {
   if (key.empty()) return nullptr;
@@ -401,19 +401,19 @@ ObjectPtr ElementObject::Ref(const std::string& key) const {
 
 std::string ElementObject::RoleClassOf(const std::string& roleKey) const {
   auto role = world_.FindElement(roleKey);
-  return role ? role->spec().roleClass : std::string();
+  return role ? role->def().roleClass : std::string();
 }
 
 void ElementObject::RecordWrite(std::string_view member, EventJson fields) {
   fields["ev"] = "element-write";
-  fields["element"] = spec_.key;
+  fields["element"] = def_.key;
   fields["member"] = member;
   world_.log().Add(std::move(fields));
 }
 
 Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   EventLog& log = world_.log();
-  const std::string& key = spec_.key;
+  const std::string& key = def_.key;
   switch (dispId) {
     // ---- every element
     case id::kName:
@@ -429,10 +429,10 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     }
     case id::kIdentifyClass:
       Read(kind, args);
-      return spec_.kind;
+      return def_.kind;
     case id::kIsKindOf:
       Read(kind, args, 1);
-      return EqualsNoCase(spec_.kind, args[0].toString());
+      return EqualsNoCase(def_.kind, args[0].toString());
     case id::kGetPropertyValue:
       Read(kind, args, 2);
       return LookUp(properties_, args[0].toString(), args[1].toString()).value_or("");
@@ -470,19 +470,19 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     // ---- class
     case id::kDisplayName:
       Read(kind, args);
-      return spec_.displayName;
+      return def_.displayName;
     case id::kGetInheritRelations: {
       Read(kind, args);
       std::vector<ObjectPtr> items;
       for (const auto& e : world_.elements())
-        if (e->kind() == "InheritRelation" && !e->removed() && e->spec().client == key) items.push_back(e);
+        if (e->kind() == "InheritRelation" && !e->removed() && e->def().client == key) items.push_back(e);
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".inherits", items, true));
     }
     case id::kDeleteInheritRel: {
       Read(kind, args, 1);
       auto* relation = dynamic_cast<ElementObject*>(args[0].toObject().get());
       if (!relation || relation->kind() != "InheritRelation" || relation->removed() ||
-          relation->spec().client != key)
+          relation->def().client != key)
         throw AutomationError(vberr::kInvalidCall, "not an inherit relation of " + key);
       relation->removed_ = true;
       RecordWrite("DeleteInheritRel", {{"value", log.Value(args[0])}});
@@ -491,36 +491,36 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     case id::kGetAssignedComponents: {
       Read(kind, args);
       std::vector<ObjectPtr> items;
-      for (const std::string& c : spec_.components) items.push_back(Ref(c));
+      for (const std::string& c : def_.components) items.push_back(Ref(c));
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".components", items, true));
     }
     case id::kIsNested:
       Read(kind, args);
-      return !spec_.nestedIn.empty();
+      return !def_.nestedIn.empty();
     case id::kEnclosingClass:
       Read(kind, args);
-      return Ref(spec_.nestedIn);
+      return Ref(def_.nestedIn);
     case simid::kClassKind:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(
           world_, "classkind:" + key,
-          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(spec_.classKind)}}));
+          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(def_.classKind)}}));
     case id::kGetClassKind:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "package:" + spec_.package,
-          std::vector<FieldsObject::Field>{{"KindTest", id::kKindTest, Variant(spec_.packageEditable)},
-                                           {"Name", id::kName, Variant(spec_.package)}}));
+          world_, "package:" + def_.package,
+          std::vector<FieldsObject::Field>{{"KindTest", id::kKindTest, Variant(def_.packageEditable)},
+                                           {"Name", id::kName, Variant(def_.package)}}));
     case simid::kGetAssignedLanguage:
       Read(kind, args);
-      return spec_.language;
+      return def_.language;
     case simid::kGetRelatedClasses: {
       Read(kind, args, 2);
       const std::string_view relationKind = RelatedKind(args[1].toInt32());
       std::vector<ObjectPtr> items;
       for (const auto& e : world_.elements())
-        if (!relationKind.empty() && e->kind() == relationKind && !e->removed() && e->spec().supplier == key)
-          if (auto client = world_.FindElement(e->spec().client); client && client->kind() == "Class")
+        if (!relationKind.empty() && e->kind() == relationKind && !e->removed() && e->def().supplier == key)
+          if (auto client = world_.FindElement(e->def().client); client && client->kind() == "Class")
             items.push_back(client);
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".related", items, true));
     }
@@ -529,66 +529,66 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     case id::kAttributeParentClass:
     case id::kOperationParentClass:
       Read(kind, args);
-      return Ref(spec_.owner);
+      return Ref(def_.owner);
 
     // ---- module
     case id::kModuleLanguage:
       Read(kind, args);
-      return spec_.language;
+      return def_.language;
 
     // ---- relations; on a role, both ends name the role's class
     case id::kHasClient:
       Read(kind, args);
-      return !spec_.client.empty();
+      return !def_.client.empty();
     case id::kHasSupplier:
       Read(kind, args);
-      return !spec_.supplier.empty();
+      return !def_.supplier.empty();
     case id::kGetClient:
     case id::kGetSupplier:
       Read(kind, args);
-      if (spec_.kind == "Role") return Ref(spec_.roleClass);
-      return Ref(dispId == id::kGetClient ? spec_.client : spec_.supplier);
+      if (def_.kind == "Role") return Ref(def_.roleClass);
+      return Ref(dispId == id::kGetClient ? def_.client : def_.supplier);
     case id::kGetSupplierClass: {
       Read(kind, args);
-      auto supplier = world_.FindElement(spec_.supplier);
+      auto supplier = world_.FindElement(def_.supplier);
       return supplier && supplier->kind() == "Class" ? ObjectPtr(supplier) : ObjectPtr();
     }
     case id::kRelationText:
       Read(kind, args);
-      return spec_.relationText;
+      return def_.relationText;
     case id::kModuleDependencyUnit:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(
           world_, "unit:" + key,
-          std::vector<FieldsObject::Field>{{"IsModifiable", id::kKindTest, Variant(spec_.unitModifiable)}}));
+          std::vector<FieldsObject::Field>{{"IsModifiable", id::kKindTest, Variant(def_.unitModifiable)}}));
 
     // ---- association
     case id::kGetOtherRole: {
       Read(kind, args, 1);
       auto* cls = dynamic_cast<ElementObject*>(args[0].toObject().get());
-      const std::string at = cls ? cls->spec().key : std::string();
-      if (!at.empty() && RoleClassOf(spec_.role1) == at) return Ref(spec_.role2);
-      if (!at.empty() && RoleClassOf(spec_.role2) == at) return Ref(spec_.role1);
+      const std::string at = cls ? cls->def().key : std::string();
+      if (!at.empty() && RoleClassOf(def_.role1) == at) return Ref(def_.role2);
+      if (!at.empty() && RoleClassOf(def_.role2) == at) return Ref(def_.role1);
       throw AutomationError(vberr::kInvalidCall, "the class is at neither end of " + key);
     }
     case simid::kRole1:
       Read(kind, args);
-      return Ref(spec_.role1);
+      return Ref(def_.role1);
     case simid::kRole2:
       Read(kind, args);
-      return Ref(spec_.role2);
+      return Ref(def_.role2);
 
     // ---- role
     case id::kGetRoleClass:
       Read(kind, args);
-      return Ref(spec_.roleClass);
+      return Ref(def_.roleClass);
     case id::kNavigable:
       Read(kind, args);
-      return spec_.navigable;
+      return def_.navigable;
     case simid::kAssociation:
       Read(kind, args);
       for (const auto& e : world_.elements())
-        if (e->kind() == "Association" && (e->spec().role1 == key || e->spec().role2 == key)) return ObjectPtr(e);
+        if (e->kind() == "Association" && (e->def().role1 == key || e->def().role2 == key)) return ObjectPtr(e);
       return Variant::Nothing();
     default:
       NoMember();

@@ -112,16 +112,16 @@ class MenuEntryObject final : public HostObject {
 
 class AddInObject final : public HostObject {
  public:
-  AddInObject(World& world, const AddInSpec& spec);
-  std::string label() const override { return "addin:" + spec_.id; }
-  const AddInSpec& spec() const { return spec_; }
+  AddInObject(World& world, const AddInDef& def);
+  std::string label() const override { return "addin:" + def_.id; }
+  const AddInDef& def() const { return def_; }
 
  protected:
   std::span<const MemberName> Names() const override;
   Variant Call(DispId id, CallKind kind, std::span<Variant> args) override;
 
  private:
-  const AddInSpec& spec_;
+  const AddInDef& def_;
   Settings settings_;
   ObjectPtr eventHandler_;
 };
@@ -141,7 +141,7 @@ class AddInManagerObject final : public HostObject {
 
 class ApplicationObject final : public HostObject {
  public:
-  ApplicationObject(World& world, const ApplicationSpec& spec, ObjectPtr manager);
+  ApplicationObject(World& world, const ApplicationDef& def, ObjectPtr manager);
   std::string label() const override { return "$app"; }
 
  protected:
@@ -149,7 +149,7 @@ class ApplicationObject final : public HostObject {
   Variant Call(DispId id, CallKind kind, std::span<Variant> args) override;
 
  private:
-  const ApplicationSpec& spec_;
+  const ApplicationDef& def_;
   ObjectPtr manager_;
   int16_t window_[4];  // top, left, height, width
 };
@@ -166,10 +166,10 @@ class ModelObject final : public HostObject {
 
 class ElementObject final : public HostObject {
  public:
-  ElementObject(World& world, const ElementSpec& spec);
-  std::string label() const override { return "element:" + spec_.key; }
-  const ElementSpec& spec() const { return spec_; }
-  const std::string& kind() const { return spec_.kind; }
+  ElementObject(World& world, const ElementDef& def);
+  std::string label() const override { return "element:" + def_.key; }
+  const ElementDef& def() const { return def_; }
+  const std::string& kind() const { return def_.kind; }
   // A relation the add-in deleted from the model.
   bool removed() const { return removed_; }
   const std::string& name() const { return name_; }
@@ -183,7 +183,7 @@ class ElementObject final : public HostObject {
   ObjectPtr Ref(const std::string& key) const;
   std::string RoleClassOf(const std::string& roleKey) const;
 
-  const ElementSpec& spec_;
+  const ElementDef& def_;
   std::string name_, stereotype_;
   Properties properties_;
   bool removed_ = false;

@@ -102,8 +102,8 @@ int Run(const Options& o) {
     throw InputError(scenarioFile, 1, "the scenario names no \"model\": give MODEL.json on the command line");
   }
   const JsonSource modelSource = JsonSource::Load(modelFile);
-  const ModelSpec model = LoadModel(modelSource);
-  const ScenarioSpec scenario = LoadScenario(scenarioSource, model);
+  const ModelDef model = LoadModel(modelSource);
+  const Scenario scenario = LoadScenario(scenarioSource, model);
 
   Sandbox sandbox(o.sandbox);
   kpx::posix::FileRegistry registry(sandbox.dir() / "registry.reg");

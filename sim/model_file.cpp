@@ -15,19 +15,19 @@ bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
   });
 }
 
-const MemberSpec* CompanionSpec::FindMember(std::string_view name) const {
+const MemberDef* CompanionDef::FindMember(std::string_view name) const {
   auto it = members.find(name);
   return it == members.end() ? nullptr : &it->second;
 }
 
-const ElementSpec* ModelSpec::FindElement(std::string_view key) const {
-  for (const ElementSpec& e : elements)
+const ElementDef* ModelDef::FindElement(std::string_view key) const {
+  for (const ElementDef& e : elements)
     if (e.key == key) return &e;
   return nullptr;
 }
 
-const AddInSpec* ModelSpec::FindAddIn(std::string_view id) const {
-  for (const AddInSpec& a : addins)
+const AddInDef* ModelDef::FindAddIn(std::string_view id) const {
+  for (const AddInDef& a : addins)
     if (a.id == id) return &a;
   return nullptr;
 }
@@ -47,9 +47,9 @@ bool IsRelationKind(std::string_view kind) {
 
 // ------------------------------------------------------------ small pieces
 
-ErrorSpec ParseError(const Node& node) {
+ErrorDef ParseError(const Node& node) {
   node.ExpectKeys({"number", "description"});
-  ErrorSpec e;
+  ErrorDef e;
   e.number = node.Member("number").Int32();
   if (e.number == 0) node.Member("number").Fail("an error number must not be 0");
   e.description = node.StringOr("description", VbErrorDescription(e.number));
@@ -193,7 +193,7 @@ ClockSetting ParseClock(const Node& node) {
 
 // ------------------------------------------------------------------ values
 
-void CheckValue(const Node& n, const ModelSpec& model, const CompanionSpec* owner, bool byRef) {
+void CheckValue(const Node& n, const ModelDef& model, const CompanionDef* owner, bool byRef) {
   const InputJson& j = n.json();
   if (j.is_null() || j.is_boolean() || j.is_string() || j.is_number_float()) return;
   if (j.is_number()) {
@@ -237,7 +237,7 @@ class ModelReader {
  public:
   explicit ModelReader(const JsonSource& source) : root_(Node::Root(source)) {}
 
-  ModelSpec Read() {
+  ModelDef Read() {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
                       "resources", "resourceComponent", "model"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
@@ -276,7 +276,7 @@ class ModelReader {
 
   void ReadApplication(const Node& n) {
     n.ExpectKeys({"path", "mainWindow", "window", "failingScripts"});
-    ApplicationSpec& a = m_.application;
+    ApplicationDef& a = m_.application;
     a.path = n.StringOr("path", a.path);
     if (auto w = n.Find("mainWindow")) a.mainWindow = w->Int32();
     if (auto w = n.Find("window")) {
@@ -348,7 +348,7 @@ class ModelReader {
 
   void CheckReference(const Reference& r) const {
     const std::string name = r.node.String();
-    const ElementSpec* e = m_.FindElement(name);
+    const ElementDef* e = m_.FindElement(name);
     if (!e) r.node.Fail("no element \"" + name + "\" in the model");
     if (!r.kinds.empty() && std::find(r.kinds.begin(), r.kinds.end(), e->kind) == r.kinds.end()) {
       std::string want;
@@ -358,10 +358,10 @@ class ModelReader {
   }
 
   void CheckNesting() const {
-    for (const ElementSpec& e : m_.elements) {
+    for (const ElementDef& e : m_.elements) {
       // Following nestedIn must end: a class cannot enclose itself.
       std::set<std::string> seen{e.key};
-      for (const ElementSpec* c = &e; !c->nestedIn.empty();) {
+      for (const ElementDef* c = &e; !c->nestedIn.empty();) {
         c = m_.FindElement(c->nestedIn);
         if (!seen.insert(c->key).second) nestedNodes_.at(e.key).Fail("classes nested in a circle");
       }
@@ -370,7 +370,7 @@ class ModelReader {
 
   void ReadElement(const Node& n, const std::string& owner) {
     n.ExpectObject("an element");
-    ElementSpec e;
+    ElementDef e;
     if (!owner.empty()) {
       e.kind = n.StringOr("kind", kindForMembers_);
       if (e.kind != kindForMembers_) n.Member("kind").Fail("this list holds only " + kindForMembers_ + "s");
@@ -470,16 +470,16 @@ class ModelReader {
     std::map<std::string, int> seen;
     for (const Node& a : list) {
       a.ExpectObject("an add-in");
-      AddInSpec spec;
-      spec.name = a.Member("name").String();
-      const int k = ++seen[spec.name];
-      spec.id = k == 1 ? spec.name : spec.name + "#" + std::to_string(k);
-      m_.addins.push_back(std::move(spec));
+      AddInDef def;
+      def.name = a.Member("name").String();
+      const int k = ++seen[def.name];
+      def.id = k == 1 ? def.name : def.name + "#" + std::to_string(k);
+      m_.addins.push_back(std::move(def));
     }
     for (size_t i = 0; i < list.size(); ++i) ReadAddIn(list[i], m_.addins[i]);
   }
 
-  void ReadAddIn(const Node& n, AddInSpec& a) {
+  void ReadAddIn(const Node& n, AddInDef& a) {
     n.ExpectKeys({"comment", "name", "settings", "installDirectory", "registryRoot", "helpFile", "contextMenus",
                   "eventHandler", "menuStates"});
     if (auto s = n.Find("settings"))
@@ -501,8 +501,8 @@ class ModelReader {
 
   // -------------------------------------------------------- companions
 
-  std::shared_ptr<const CompanionSpec> ReadCompanion(const Node& n, bool creatable) {
-    auto c = std::make_shared<CompanionSpec>();
+  std::shared_ptr<const CompanionDef> ReadCompanion(const Node& n, bool creatable) {
+    auto c = std::make_shared<CompanionDef>();
     if (creatable) {
       n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "members", "objects"});
       c->progid = n.StringOr("progid", "");
@@ -522,18 +522,18 @@ class ModelReader {
     if (auto ops = n.Find("operations"))
       for (const Node& op : ops->Elements()) c->operations.push_back(op.String());
     if (auto objs = n.Find("objects"))
-      for (const auto& [name, spec] : objs->Members()) c->objects[name] = ReadCompanion(spec, false);
+      for (const auto& [name, def] : objs->Members()) c->objects[name] = ReadCompanion(def, false);
     if (auto members = n.Find("members"))
-      for (const auto& [name, spec] : members->Members()) {
+      for (const auto& [name, def] : members->Members()) {
         if (c->FindMember(name)) members->FailKey(name, "a second member \"" + name + "\" (names ignore case)");
-        c->members[name] = ReadMember(spec, *c);
+        c->members[name] = ReadMember(def, *c);
       }
     return c;
   }
 
-  MemberSpec ReadMember(const Node& n, const CompanionSpec& owner) {
+  MemberDef ReadMember(const Node& n, const CompanionDef& owner) {
     n.ExpectKeys({"comment", "returns", "raise", "setArgs"});
-    MemberSpec m;
+    MemberDef m;
     if (auto r = n.Find("returns")) {
       if (r->IsObject() && r->json().size() == 1 && r->json().contains("companion"))
         m.returnsObject = ReadCompanion(r->Member("companion"), false);
@@ -553,7 +553,7 @@ class ModelReader {
   }
 
   Node root_;
-  ModelSpec m_;
+  ModelDef m_;
   std::vector<Reference> references_;
   std::map<std::string, Node> nestedNodes_;
   std::string kindForMembers_;
@@ -561,6 +561,6 @@ class ModelReader {
 
 }  // namespace
 
-ModelSpec LoadModel(const JsonSource& source) { return ModelReader(source).Read(); }
+ModelDef LoadModel(const JsonSource& source) { return ModelReader(source).Read(); }
 
 }  // namespace kpx::sim

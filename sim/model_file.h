@@ -25,7 +25,7 @@ struct NoCaseLess {
   using is_transparent = void;
 };
 
-struct ErrorSpec {
+struct ErrorDef {
   int32_t number = 0;
   std::string description;
 };
@@ -45,49 +45,49 @@ struct ClockSetting {
 };
 
 // A companion member: what a call answers.
-struct CompanionSpec;
-struct MemberSpec {
+struct CompanionDef;
+struct MemberDef {
   std::optional<InputJson> returns;                   // a value (checked)
-  std::shared_ptr<const CompanionSpec> returnsObject;  // or a companion of its own
-  std::optional<ErrorSpec> raise;
+  std::shared_ptr<const CompanionDef> returnsObject;  // or a companion of its own
+  std::optional<ErrorDef> raise;
   std::vector<InputJson> setArgs;  // written back to by-reference arguments, by position
 };
 
-struct CompanionSpec {
+struct CompanionDef {
   std::string progid;  // one of progid and clsid names how it is created
   std::string clsid;
-  std::optional<ErrorSpec> createError;
+  std::optional<ErrorDef> createError;
   std::vector<std::string> operations;  // its own interface, in order
-  std::map<std::string, MemberSpec, NoCaseLess> members;
-  std::map<std::string, std::shared_ptr<const CompanionSpec>> objects;
+  std::map<std::string, MemberDef, NoCaseLess> members;
+  std::map<std::string, std::shared_ptr<const CompanionDef>> objects;
 
-  const MemberSpec* FindMember(std::string_view name) const;
+  const MemberDef* FindMember(std::string_view name) const;
 };
 
 using Settings = std::map<std::string, std::map<std::string, std::string, NoCaseLess>, NoCaseLess>;
 
-struct AddInSpec {
+struct AddInDef {
   std::string name;
   std::string id;  // name, or "name#k" for the k-th add-in of that name
   Settings settings;
   std::string installDirectory, registryRoot, helpFile;
   bool contextMenus = true;
-  std::shared_ptr<const CompanionSpec> eventHandler;
+  std::shared_ptr<const CompanionDef> eventHandler;
   std::map<std::string, InputJson> menuStates;  // initial "MenuState" by internal name
 };
 
-struct ApplicationSpec {
+struct ApplicationDef {
   std::string path = "C:\\Program Files\\Quarn";
   int32_t mainWindow = 4242;
   int16_t top = 0, left = 0, height = 600, width = 800;
-  std::map<std::string, ErrorSpec, NoCaseLess> failingScripts;
+  std::map<std::string, ErrorDef, NoCaseLess> failingScripts;
 };
 
 using Properties = std::map<std::string, std::map<std::string, std::string, NoCaseLess>, NoCaseLess>;
 
 // One model element. `key` is how files and scenarios name it: the name for
 // top-level elements, "Class.member" for attributes and operations.
-struct ElementSpec {
+struct ElementDef {
   std::string key, name, kind, stereotype, displayName;
   Properties properties;
   // Class and module.
@@ -108,22 +108,22 @@ struct ElementSpec {
   bool navigable = false;
 };
 
-struct ModelSpec {
+struct ModelDef {
   std::vector<RegistryEntry> registry;
   std::vector<std::pair<std::string, std::string>> files;
   std::vector<std::string> folders;
   ClockSetting clock;
-  ApplicationSpec application;
-  std::vector<AddInSpec> addins;
-  std::vector<std::shared_ptr<const CompanionSpec>> companions;
+  ApplicationDef application;
+  std::vector<AddInDef> addins;
+  std::vector<std::shared_ptr<const CompanionDef>> companions;
   std::map<int32_t, std::string> resources;
   bool resourceRegistered = true;
   Properties modelProperties;
-  std::vector<ElementSpec> elements;
+  std::vector<ElementDef> elements;
   std::vector<std::string> selection;
 
-  const ElementSpec* FindElement(std::string_view key) const;
-  const AddInSpec* FindAddIn(std::string_view id) const;
+  const ElementDef* FindElement(std::string_view key) const;
+  const AddInDef* FindAddIn(std::string_view id) const;
 };
 
 // The element kinds the simulated host knows, as IdentifyClass names them.
@@ -131,17 +131,17 @@ const std::vector<std::string_view>& ElementKinds();
 bool IsRelationKind(std::string_view kind);
 
 // Reads a model file. Raises InputError.
-ModelSpec LoadModel(const JsonSource& source);
+ModelDef LoadModel(const JsonSource& source);
 
 // Pieces the scenario file shares with the model file.
 std::vector<RegistryEntry> ParseRegistry(const Node& node);
 ClockSetting ParseClock(const Node& node);
 // {"number": n, "description": "..."}
-ErrorSpec ParseError(const Node& node);
+ErrorDef ParseError(const Node& node);
 
 // Checks a value of the files (the forms are in values.h) against the model.
 // `owner` is the companion whose sub-objects a value may name (none outside
 // companions); `byRef` allows one {"byref": ...} wrapper at the top.
-void CheckValue(const Node& value, const ModelSpec& model, const CompanionSpec* owner, bool byRef);
+void CheckValue(const Node& value, const ModelDef& model, const CompanionDef* owner, bool byRef);
 
 }  // namespace kpx::sim

@@ -26,7 +26,7 @@ const ApiMember* FindMember(std::string_view name) {
   return nullptr;
 }
 
-void ReadCall(const Node& n, const ModelSpec& model, Action& a) {
+void ReadCall(const Node& n, const ModelDef& model, Action& a) {
   n.ExpectKeys({"comment", "call", "args", "kind"});
   const Node name = n.Member("call");
   const ApiMember* member = FindMember(name.String());
@@ -59,10 +59,10 @@ void ReadCall(const Node& n, const ModelSpec& model, Action& a) {
 
 }  // namespace
 
-ScenarioSpec LoadScenario(const JsonSource& source, const ModelSpec& model) {
+Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   const Node root = Node::Root(source);
   root.ExpectKeys({"comment", "model", "actions"});
-  ScenarioSpec s;
+  Scenario s;
   std::vector<Node> actions = root.Member("actions").Elements();
   s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create");
   bool alive = s.implicitCreate;

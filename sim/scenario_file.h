@@ -34,7 +34,7 @@ struct Action {
   std::vector<std::pair<std::string, std::optional<std::string>>> files;  // no content: delete
 };
 
-struct ScenarioSpec {
+struct Scenario {
   std::vector<Action> actions;
   // The run creates the add-in object itself unless the first action does.
   bool implicitCreate = true;
@@ -43,6 +43,6 @@ struct ScenarioSpec {
 // The model file the scenario names, relative to the scenario's folder.
 std::optional<std::filesystem::path> ScenarioModelPath(const JsonSource& scenario);
 
-ScenarioSpec LoadScenario(const JsonSource& source, const ModelSpec& model);
+Scenario LoadScenario(const JsonSource& source, const ModelDef& model);
 
 }  // namespace kpx::sim

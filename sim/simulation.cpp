@@ -4,7 +4,7 @@
 
 namespace kpx::sim {
 
-Simulation::Simulation(const ModelSpec& model, Environment environment)
+Simulation::Simulation(const ModelDef& model, Environment environment)
     : model_(model),
       env_(environment),
       world_(model, log_),
@@ -32,7 +32,7 @@ void Simulation::Prepare() {
   clock_.Set(model_.clock);
 }
 
-void Simulation::Run(const ScenarioSpec& scenario) {
+void Simulation::Run(const Scenario& scenario) {
   Prepare();
   if (scenario.implicitCreate) Create();
   for (const Action& action : scenario.actions) Apply(action);

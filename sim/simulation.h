@@ -27,7 +27,7 @@ struct Environment {
 class Simulation {
  public:
   // `model` must outlive the simulation.
-  Simulation(const ModelSpec& model, Environment environment);
+  Simulation(const ModelDef& model, Environment environment);
   ~Simulation();
   Simulation(const Simulation&) = delete;
   Simulation& operator=(const Simulation&) = delete;
@@ -37,7 +37,7 @@ class Simulation {
   void Prepare();
   // Prepares, then plays the scenario. Releases the add-in object at the
   // end if the scenario left it alive. Once per simulation.
-  void Run(const ScenarioSpec& scenario);
+  void Run(const Scenario& scenario);
 
   const EventLog& log() const { return log_; }
   EventLog& log() { return log_; }
@@ -53,7 +53,7 @@ class Simulation {
  private:
   void Call(const Action& action);
 
-  const ModelSpec& model_;
+  const ModelDef& model_;
   Environment env_;
   EventLog log_;
   World world_;

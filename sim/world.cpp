@@ -8,15 +8,15 @@
 
 namespace kpx::sim {
 
-World::World(const ModelSpec& spec, EventLog& log) : spec_(spec), log_(log), selection_(spec.selection) {
-  for (const AddInSpec& a : spec.addins) addins_.push_back(std::make_shared<AddInObject>(*this, a));
+World::World(const ModelDef& def, EventLog& log) : def_(def), log_(log), selection_(def.selection) {
+  for (const AddInDef& a : def.addins) addins_.push_back(std::make_shared<AddInObject>(*this, a));
   auto collection =
       std::make_shared<CollectionObject>(*this, "$app.AddIns", std::vector<ObjectPtr>(addins_.begin(), addins_.end()),
                                          false);
   application_ =
-      std::make_shared<ApplicationObject>(*this, spec.application, std::make_shared<AddInManagerObject>(*this, collection));
+      std::make_shared<ApplicationObject>(*this, def.application, std::make_shared<AddInManagerObject>(*this, collection));
   model_ = std::make_shared<ModelObject>(*this);
-  for (const ElementSpec& e : spec.elements) elements_.push_back(std::make_shared<ElementObject>(*this, e));
+  for (const ElementDef& e : def.elements) elements_.push_back(std::make_shared<ElementObject>(*this, e));
 }
 
 World::~World() = default;
@@ -25,13 +25,13 @@ ObjectPtr World::application() const { return application_; }
 
 std::shared_ptr<ElementObject> World::FindElement(std::string_view key) const {
   for (const auto& e : elements_)
-    if (e->spec().key == key) return e;
+    if (e->def().key == key) return e;
   return nullptr;
 }
 
 std::shared_ptr<AddInObject> World::FindAddIn(std::string_view id) const {
   for (const auto& a : addins_)
-    if (a->spec().id == id) return a;
+    if (a->def().id == id) return a;
   return nullptr;
 }
 

@@ -22,13 +22,13 @@ class ElementObject;
 
 class World {
  public:
-  World(const ModelSpec& spec, EventLog& log);
+  World(const ModelDef& def, EventLog& log);
   ~World();
   World(const World&) = delete;
   World& operator=(const World&) = delete;
 
   EventLog& log() { return log_; }
-  const ModelSpec& spec() const { return spec_; }
+  const ModelDef& def() const { return def_; }
 
   ObjectPtr application() const;
   ObjectPtr model() const { return model_; }
@@ -53,7 +53,7 @@ class World {
   std::string NextLabel(const std::string& base);
 
  private:
-  const ModelSpec& spec_;
+  const ModelDef& def_;
   EventLog& log_;
   std::shared_ptr<ApplicationObject> application_;
   ObjectPtr model_;

@@ -94,7 +94,7 @@ TEST(SimModelFaults, EachFaultNamesTheLineOfTheOffendingValue) {
 }
 
 TEST(SimModelRegistry, ValueFormsBecomeTheRegistryTypesTheyName) {
-  const ModelSpec m = ParseModel(R"({"registry": {
+  const ModelDef m = ParseModel(R"({"registry": {
     "HKLM\\SOFTWARE\\K": {"Debug": 2130706560, "Neg": -1, "Hex": {"dword": "0xff000080"},
                            "Path": "C:\\log.txt", "@": "dflt", "Empty": {"sz": ""}, "Raw": {"binary": "0102ff"}},
     "hkey_current_user\\Only\\Key": {}
@@ -124,11 +124,11 @@ TEST(SimModelRegistry, ValueFormsBecomeTheRegistryTypesTheyName) {
 }
 
 TEST(SimModelElements, MembersGetQualifiedKeysAndRelationsDefaultTheirText) {
-  const ModelSpec m = ParseModel(R"({"model": {"elements": [
+  const ModelDef m = ParseModel(R"({"model": {"elements": [
     {"kind": "Class", "name": "CFoo", "attributes": [{"name": "m_x"}], "operations": [{"name": "Run"}]},
     {"kind": "Class", "name": "IBar"},
     {"kind": "InheritRelation", "name": "r", "client": "CFoo", "supplier": "IBar"}]}})");
-  const ElementSpec* x = m.FindElement("CFoo.m_x");
+  const ElementDef* x = m.FindElement("CFoo.m_x");
   ASSERT_NE(nullptr, x);
   EXPECT_EQ("m_x", x->name);
   EXPECT_EQ("Attribute", x->kind);
@@ -139,7 +139,7 @@ TEST(SimModelElements, MembersGetQualifiedKeysAndRelationsDefaultTheirText) {
 }
 
 TEST(SimModelAddIns, NamesakesAreNumberedInListOrder) {
-  const ModelSpec m = ParseModel(R"({"addins": [{"name": "VisualStudio"}, {"name": "VC++"}, {"name": "VisualStudio"}]})");
+  const ModelDef m = ParseModel(R"({"addins": [{"name": "VisualStudio"}, {"name": "VC++"}, {"name": "VisualStudio"}]})");
   ASSERT_EQ(3u, m.addins.size());
   EXPECT_EQ("VisualStudio", m.addins[0].id);
   EXPECT_EQ("VC++", m.addins[1].id);
@@ -148,7 +148,7 @@ TEST(SimModelAddIns, NamesakesAreNumberedInListOrder) {
 }
 
 TEST(SimClockSetting, DatesAndTimesAreReadExactly) {
-  const ModelSpec m = ParseModel(R"({"clock": {"date": "2024-02-29", "time": "23:59:59.25", "step": 0.5}})");
+  const ModelDef m = ParseModel(R"({"clock": {"date": "2024-02-29", "time": "23:59:59.25", "step": 0.5}})");
   EXPECT_EQ(2024, m.clock.date->year);
   EXPECT_EQ(2, m.clock.date->month);
   EXPECT_EQ(29, m.clock.date->day);
@@ -164,7 +164,7 @@ const char* kModel = R"({"addins": [{"name": "VC++"}],
   "model": {"elements": [{"kind": "Class", "name": "CFoo"}]}})";
 
 int ScenarioFault(const std::string& text, std::string* message = nullptr) {
-  const ModelSpec model = ParseModel(kModel);
+  const ModelDef model = ParseModel(kModel);
   return FaultLine([&] { LoadScenario(JsonSource("s.json", text), model); }, message);
 }
 
@@ -217,7 +217,7 @@ TEST(SimScenarioFaults, TheAddInObjectsLifeIsChecked) {
 }
 
 TEST(SimScenario, TheFirstActionDecidesWhetherTheRunCreatesTheObject) {
-  const ModelSpec model = ParseModel(kModel);
+  const ModelDef model = ParseModel(kModel);
   EXPECT_TRUE(LoadScenario(JsonSource("s.json", R"({"actions": []})"), model).implicitCreate);
   EXPECT_TRUE(LoadScenario(JsonSource("s.json", R"({"actions": [{"call": "Name"}]})"), model).implicitCreate);
   EXPECT_FALSE(LoadScenario(JsonSource("s.json", R"({"actions": [{"create": true}]})"), model).implicitCreate);

@@ -39,7 +39,7 @@ class TempDir {
   std::filesystem::path path_;
 };
 
-inline ModelSpec ParseModel(const std::string& text) { return LoadModel(JsonSource("model.json", text)); }
+inline ModelDef ParseModel(const std::string& text) { return LoadModel(JsonSource("model.json", text)); }
 
 // The line an input error names; -1 when nothing was raised.
 inline int FaultLine(const std::function<void()>& load, std::string* message = nullptr) {
@@ -68,7 +68,7 @@ class SimWorld {
   EventLog& log() { return sim_.log(); }
   posix::FileRegistry& registry() { return registry_; }
   posix::SandboxFileSystem& files() { return files_; }
-  const ModelSpec& model() const { return model_; }
+  const ModelDef& model() const { return model_; }
 
   // Runs a scenario given as text against this world.
   void Run(const std::string& scenarioText) {
@@ -85,7 +85,7 @@ class SimWorld {
   }
 
  private:
-  ModelSpec model_;
+  ModelDef model_;
   TempDir dir_;
   posix::FileRegistry registry_;
   posix::SandboxFileSystem files_;
