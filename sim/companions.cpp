@@ -11,10 +11,14 @@ namespace {
 
 const char* KindName(CallKind kind) {
   switch (kind) {
-    case CallKind::Method: return "method";
-    case CallKind::PropertyGet: return "get";
-    case CallKind::PropertyPut: return "put";
-    case CallKind::PropertyPutRef: return "putref";
+    case CallKind::Method:
+      return "method";
+    case CallKind::PropertyGet:
+      return "get";
+    case CallKind::PropertyPut:
+      return "put";
+    case CallKind::PropertyPutRef:
+      return "putref";
   }
   return "?";
 }
@@ -69,8 +73,7 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
       break;
     }
   EventJson shown = EventJson::array();
-  for (const Variant& a : args)
-    shown.push_back(a.isByRef() ? EventJson{{"byref", log.Value(a)}} : log.Value(a));
+  for (const Variant& a : args) shown.push_back(a.isByRef() ? EventJson{{"byref", log.Value(a)}} : log.Value(a));
   call["args"] = std::move(shown);
 
   const MemberDef* member = def_->FindMember(name);
@@ -91,8 +94,10 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
     written[std::to_string(i + 1)] = log.Value(args[i]);
   }
   Variant result;
-  if (member->returnsObject) result = ReturnedObject(name, member->returnsObject);
-  else if (member->returns) result = world_.ToVariant(*member->returns, this);
+  if (member->returnsObject)
+    result = ReturnedObject(name, member->returnsObject);
+  else if (member->returns)
+    result = world_.ToVariant(*member->returns, this);
   call["result"] = log.Value(result);
   if (!written.empty()) call["byref"] = std::move(written);
   log.Add(std::move(call));

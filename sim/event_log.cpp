@@ -28,20 +28,30 @@ double ShortestDouble(float f) {
 EventJson EventLog::Value(const Variant& value) const {
   const Variant& v = value.deref();
   switch (v.type()) {
-    case VarType::Empty: return nullptr;
-    case VarType::Null: return {{"null", true}};
-    case VarType::Boolean: return v.toBool();
-    case VarType::Integer: return {{"i2", v.toInt16()}};
-    case VarType::Long: return v.toInt32();
-    case VarType::Single: return {{"r4", ShortestDouble(v.toSingle())}};
-    case VarType::Double: return {{"r8", v.toDouble()}};
-    case VarType::String: return v.stringRef();
-    case VarType::Date: return {{"date", v.toDate()}};
+    case VarType::Empty:
+      return nullptr;
+    case VarType::Null:
+      return {{"null", true}};
+    case VarType::Boolean:
+      return v.toBool();
+    case VarType::Integer:
+      return {{"i2", v.toInt16()}};
+    case VarType::Long:
+      return v.toInt32();
+    case VarType::Single:
+      return {{"r4", ShortestDouble(v.toSingle())}};
+    case VarType::Double:
+      return {{"r8", v.toDouble()}};
+    case VarType::String:
+      return v.stringRef();
+    case VarType::Date:
+      return {{"date", v.toDate()}};
     case VarType::Object: {
       ObjectPtr o = v.objectOrNull();
       return {{"object", o ? EventJson(Label(o.get())) : EventJson(nullptr)}};
     }
-    case VarType::ByRef: break;  // deref() never stops at a reference
+    case VarType::ByRef:
+      break;  // deref() never stops at a reference
   }
   return nullptr;
 }

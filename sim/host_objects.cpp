@@ -112,7 +112,10 @@ Variant CollectionObject::Call(DispId dispId, CallKind kind, std::span<Variant> 
 // ----------------------------------------------------------- MenuEntryObject
 
 MenuEntryObject::MenuEntryObject(World& world, std::string label, std::string addin, std::string name, Variant state)
-    : HostObject(world), label_(std::move(label)), addin_(std::move(addin)), name_(std::move(name)),
+    : HostObject(world),
+      label_(std::move(label)),
+      addin_(std::move(addin)),
+      name_(std::move(name)),
       state_(std::move(state)) {}
 
 std::span<const MemberName> MenuEntryObject::Names() const {
@@ -132,8 +135,7 @@ Variant MenuEntryObject::Call(DispId, CallKind kind, std::span<Variant> args) {
 
 // --------------------------------------------------------------- AddInObject
 
-AddInObject::AddInObject(World& world, const AddInDef& def)
-    : HostObject(world), def_(def), settings_(def.settings) {
+AddInObject::AddInObject(World& world, const AddInDef& def) : HostObject(world), def_(def), settings_(def.settings) {
   if (def.eventHandler)
     eventHandler_ = std::make_shared<CompanionObject>(world, def.eventHandler, label() + ".EventHandler");
 }
@@ -176,8 +178,12 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
           value = e->second;
           found = true;
         }
-      log.Add({{"ev", "setting-read"}, {"addin", def_.id}, {"section", section}, {"entry", entry},
-               {"value", value}, {"found", found}});
+      log.Add({{"ev", "setting-read"},
+               {"addin", def_.id},
+               {"section", section},
+               {"entry", entry},
+               {"value", value},
+               {"found", found}});
       return value;
     }
     case id::kWriteSetting: {
@@ -194,8 +200,8 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
       log.Add({{"ev", "menu-add"}, {"addin", def_.id}, {"itemType", itemType}, {"caption", caption}, {"name", name}});
       Variant state;
       if (auto s = def_.menuStates.find(name); s != def_.menuStates.end()) state = world_.ToVariant(s->second);
-      return ObjectPtr(std::make_shared<MenuEntryObject>(world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)),
-                                                         def_.id, name, state));
+      return ObjectPtr(std::make_shared<MenuEntryObject>(
+          world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)), def_.id, name, state));
     }
     case id::kHelpFile:
       Read(kind, args);
@@ -229,16 +235,20 @@ Variant AddInManagerObject::Call(DispId, CallKind kind, std::span<Variant> args)
 // --------------------------------------------------------- ApplicationObject
 
 ApplicationObject::ApplicationObject(World& world, const ApplicationDef& def, ObjectPtr manager)
-    : HostObject(world), def_(def), manager_(std::move(manager)),
-      window_{def.top, def.left, def.height, def.width} {}
+    : HostObject(world), def_(def), manager_(std::move(manager)), window_{def.top, def.left, def.height, def.width} {}
 
 std::span<const MemberName> ApplicationObject::Names() const {
   static constexpr MemberName kNames[] = {
-      {"CurrentModel", id::kCurrentModel}, {"WriteErrorLog", id::kWriteErrorLog},
-      {"ApplicationPath", id::kApplicationPath}, {"ExecuteScript", id::kExecuteScript},
-      {"AddInManager", id::kAddInManager},  {"Top", id::kWindowTop},
-      {"Left", id::kWindowLeft},            {"Height", id::kWindowHeight},
-      {"Width", id::kWindowWidth},          {id::kGetMainWnd, simid::kGetMainWnd},
+      {"CurrentModel", id::kCurrentModel},
+      {"WriteErrorLog", id::kWriteErrorLog},
+      {"ApplicationPath", id::kApplicationPath},
+      {"ExecuteScript", id::kExecuteScript},
+      {"AddInManager", id::kAddInManager},
+      {"Top", id::kWindowTop},
+      {"Left", id::kWindowLeft},
+      {"Height", id::kWindowHeight},
+      {"Width", id::kWindowWidth},
+      {id::kGetMainWnd, simid::kGetMainWnd},
   };
   return kNames;
 }
@@ -285,7 +295,9 @@ Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant>
       }
       slot = PutValue(kind, args).toInt16();
       static constexpr const char* kNames[] = {"Top", "Left", "Height", "Width"};
-      log.Add({{"ev", "element-write"}, {"element", "$app"}, {"member", kNames[dispId - id::kWindowTop]},
+      log.Add({{"ev", "element-write"},
+               {"element", "$app"},
+               {"member", kNames[dispId - id::kWindowTop]},
                {"value", log.Value(Variant(slot))}});
       return {};
     }
@@ -333,7 +345,7 @@ const NameTable& NamesFor(const std::string& kind) {
         {"OverrideProperty", id::kOverrideProperty},
     };
     const NameTable relation = {
-        {"HasClient", id::kHasClient},   {"HasSupplier", id::kHasSupplier},   {"GetClient", id::kGetClient},
+        {"HasClient", id::kHasClient},     {"HasSupplier", id::kHasSupplier},   {"GetClient", id::kGetClient},
         {"GetSupplier", id::kGetSupplier}, {"RelationText", id::kRelationText},
     };
     auto with = [](NameTable base, std::initializer_list<NameTable> more) {
@@ -381,9 +393,12 @@ const NameTable& NamesFor(const std::string& kind) {
 // The relation kind GetRelatedClasses(0, n) follows.
 std::string_view RelatedKind(int32_t n) {
   switch (n) {
-    case 5: return "DependencyRelation";
-    case 6: return "RealizeRelation";
-    default: return {};
+    case 5:
+      return "DependencyRelation";
+    case 6:
+      return "RealizeRelation";
+    default:
+      return {};
   }
 }
 
@@ -481,8 +496,7 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     case id::kDeleteInheritRel: {
       Read(kind, args, 1);
       auto* relation = dynamic_cast<ElementObject*>(args[0].toObject().get());
-      if (!relation || relation->kind() != "InheritRelation" || relation->removed() ||
-          relation->def().client != key)
+      if (!relation || relation->kind() != "InheritRelation" || relation->removed() || relation->def().client != key)
         throw AutomationError(vberr::kInvalidCall, "not an inherit relation of " + key);
       relation->removed_ = true;
       RecordWrite("DeleteInheritRel", {{"value", log.Value(args[0])}});
@@ -503,8 +517,7 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     case simid::kClassKind:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "classkind:" + key,
-          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(def_.classKind)}}));
+          world_, "classkind:" + key, std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(def_.classKind)}}));
     case id::kGetClassKind:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(

@@ -18,9 +18,12 @@ std::string PointerAppend(const std::string& pointer, std::string_view token) {
   std::string out = pointer;
   out += '/';
   for (char c : token) {
-    if (c == '~') out += "~0";
-    else if (c == '/') out += "~1";
-    else out += c;
+    if (c == '~')
+      out += "~0";
+    else if (c == '/')
+      out += "~1";
+    else
+      out += c;
   }
   return out;
 }
@@ -139,15 +142,23 @@ std::string ParseErrorText(const std::string& what) {
 
 const char* TypeName(const InputJson& j) {
   switch (j.type()) {
-    case InputJson::value_t::null: return "null";
-    case InputJson::value_t::object: return "an object";
-    case InputJson::value_t::array: return "a list";
-    case InputJson::value_t::string: return "a string";
-    case InputJson::value_t::boolean: return "true or false";
+    case InputJson::value_t::null:
+      return "null";
+    case InputJson::value_t::object:
+      return "an object";
+    case InputJson::value_t::array:
+      return "a list";
+    case InputJson::value_t::string:
+      return "a string";
+    case InputJson::value_t::boolean:
+      return "true or false";
     case InputJson::value_t::number_integer:
-    case InputJson::value_t::number_unsigned: return "a whole number";
-    case InputJson::value_t::number_float: return "a number";
-    default: return "something else";
+    case InputJson::value_t::number_unsigned:
+      return "a whole number";
+    case InputJson::value_t::number_float:
+      return "a number";
+    default:
+      return "something else";
   }
 }
 

@@ -7,14 +7,13 @@
 #include <filesystem>
 #include <initializer_list>
 #include <map>
+#include <nlohmann/json.hpp>
 #include <optional>
 #include <stdexcept>
 #include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
-
-#include <nlohmann/json.hpp>
 
 namespace kpx::sim {
 

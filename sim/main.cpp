@@ -42,7 +42,8 @@ class Sandbox {
       if (fs::exists(dir_)) {
         if (!fs::is_directory(dir_)) throw std::runtime_error(dir_.string() + " is not a folder");
         if (!fs::is_empty(dir_) && !fs::exists(dir_ / kMarker))
-          throw std::runtime_error("refusing to empty " + dir_.string() + ": it holds files and is not a kpx-sim sandbox");
+          throw std::runtime_error("refusing to empty " + dir_.string() +
+                                   ": it holds files and is not a kpx-sim sandbox");
         for (const fs::directory_entry& entry : fs::directory_iterator(dir_)) fs::remove_all(entry.path());
       }
       keep_ = true;
@@ -80,11 +81,16 @@ std::optional<Options> ParseOptions(int argc, char** argv) {
   Options o;
   for (int i = 1; i < argc; ++i) {
     const std::string arg = argv[i];
-    if (arg == "--jsonl") o.jsonl = true;
-    else if (arg == "--out" && i + 1 < argc) o.out = argv[++i];
-    else if (arg == "--sandbox" && i + 1 < argc) o.sandbox = fs::path(argv[++i]);
-    else if (arg.rfind("--", 0) == 0) return std::nullopt;
-    else o.files.push_back(arg);
+    if (arg == "--jsonl")
+      o.jsonl = true;
+    else if (arg == "--out" && i + 1 < argc)
+      o.out = argv[++i];
+    else if (arg == "--sandbox" && i + 1 < argc)
+      o.sandbox = fs::path(argv[++i]);
+    else if (arg.rfind("--", 0) == 0)
+      return std::nullopt;
+    else
+      o.files.push_back(arg);
   }
   if (o.files.empty() || o.files.size() > 2) return std::nullopt;
   return o;
@@ -114,9 +120,9 @@ int Run(const Options& o) {
     Simulation simulation(model, Environment{registry, files, seeder});
     simulation.Run(scenario);
     output = o.jsonl ? simulation.log().Jsonl()
-                     : Transcript(simulation.log().events(),
-                                  "kpx-sim: model " + modelFile.string() + ", scenario " + scenarioFile +
-                                      (o.sandbox ? ", sandbox " + o.sandbox->string() : ""));
+                     : Transcript(simulation.log().events(), "kpx-sim: model " + modelFile.string() + ", scenario " +
+                                                                 scenarioFile +
+                                                                 (o.sandbox ? ", sandbox " + o.sandbox->string() : ""));
   }
   if (o.out) {
     std::ofstream out(*o.out, std::ios::binary | std::ios::trunc);

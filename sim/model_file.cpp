@@ -33,10 +33,17 @@ const AddInDef* ModelDef::FindAddIn(std::string_view id) const {
 }
 
 const std::vector<std::string_view>& ElementKinds() {
-  static const std::vector<std::string_view> kKinds = {
-      "Class",           "Module",          "Attribute",  "Operation",          "Role",
-      "Association",     "InheritRelation", "RealizeRelation", "HasRelation", "DependencyRelation",
-      "ModuleVisibilityRelationship"};
+  static const std::vector<std::string_view> kKinds = {"Class",
+                                                       "Module",
+                                                       "Attribute",
+                                                       "Operation",
+                                                       "Role",
+                                                       "Association",
+                                                       "InheritRelation",
+                                                       "RealizeRelation",
+                                                       "HasRelation",
+                                                       "DependencyRelation",
+                                                       "ModuleVisibilityRelationship"};
   return kKinds;
 }
 
@@ -141,7 +148,8 @@ std::vector<RegistryEntry> ParseRegistry(const Node& node) {
     const size_t slash = fullKey.find('\\');
     std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
     if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
-      node.FailKey(fullKey, "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+      node.FailKey(fullKey,
+                   "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
     values.ExpectObject("an object of values");
     RegistryEntry keyOnly;
     keyOnly.root = *root;
@@ -204,13 +212,17 @@ void CheckValue(const Node& n, const ModelDef& model, const CompanionDef* owner,
   if (j.size() != 1) n.Fail("a typed value is an object with exactly one key, such as {\"i2\": 4}");
   const std::string form = j.begin().key();
   const Node inner = n.Member(form);
-  if (form == "string") inner.String();
+  if (form == "string")
+    inner.String();
   else if (form == "i2") {
     int64_t v = inner.Integer();
     if (v < -32768 || v > 32767) inner.Fail("number out of the 16-bit range");
-  } else if (form == "i4") inner.Int32();
-  else if (form == "r4" || form == "r8" || form == "date") inner.Number();
-  else if (form == "bool") inner.Bool();
+  } else if (form == "i4")
+    inner.Int32();
+  else if (form == "r4" || form == "r8" || form == "date")
+    inner.Number();
+  else if (form == "bool")
+    inner.Bool();
   else if (form == "null" || form == "nothing") {
     if (!inner.Bool()) inner.Fail("write {\"" + form + "\": true}");
   } else if (form == "element") {
@@ -388,7 +400,8 @@ class ModelReader {
 
     std::vector<std::string_view> keys = {"comment", "name", "kind", "stereotype", "displayName", "properties"};
     if (e.kind == "Class")
-      keys.insert(keys.end(), {"language", "components", "nestedIn", "classKind", "package", "attributes", "operations"});
+      keys.insert(keys.end(),
+                  {"language", "components", "nestedIn", "classKind", "package", "attributes", "operations"});
     else if (e.kind == "Module")
       keys.push_back("language");
     else if (IsRelationKind(e.kind))

@@ -17,7 +17,7 @@ std::optional<std::filesystem::path> ScenarioModelPath(const JsonSource& scenari
 
 namespace {
 
-constexpr std::string_view kActionKeys[] = {"call",  "select",  "answer",      "clock",
+constexpr std::string_view kActionKeys[] = {"call",    "select", "answer",      "clock",
                                             "release", "create", "setRegistry", "setFile"};
 
 const ApiMember* FindMember(std::string_view name) {
@@ -35,9 +35,12 @@ void ReadCall(const Node& n, const ModelDef& model, Action& a) {
   a.kind = member->kind;
   if (auto k = n.Find("kind")) {
     const std::string kind = k->String();
-    if (kind == "method") a.kind = CallKind::Method;
-    else if (kind == "get") a.kind = CallKind::PropertyGet;
-    else k->Fail("a call's kind is \"method\" or \"get\"");
+    if (kind == "method")
+      a.kind = CallKind::Method;
+    else if (kind == "get")
+      a.kind = CallKind::PropertyGet;
+    else
+      k->Fail("a call's kind is \"method\" or \"get\"");
   }
   size_t required = 0;
   for (size_t i = 0; i < member->paramCount; ++i)
@@ -81,7 +84,8 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       if (!which.empty()) n.FailKey(key, "one action per entry: \"" + which + "\" and \"" + key + "\"");
       which = key;
     }
-    if (which.empty()) n.Fail("an action needs one of call, select, answer, clock, release, create, setRegistry, setFile");
+    if (which.empty())
+      n.Fail("an action needs one of call, select, answer, clock, release, create, setRegistry, setFile");
     const Node body = n.Member(which);
 
     if (which == "call") {

@@ -83,7 +83,11 @@ int SimUserInterface::MessageBox(std::string_view text, std::string_view title, 
     answer = answers_.front();
     answers_.pop_front();
   }
-  log_.Add({{"ev", "messagebox"}, {"text", text}, {"title", title}, {"style", style}, {"answer", answer},
+  log_.Add({{"ev", "messagebox"},
+            {"text", text},
+            {"title", title},
+            {"style", style},
+            {"answer", answer},
             {"answered", scripted ? "scenario" : "default"}});
   return answer;
 }
@@ -99,18 +103,24 @@ void SimUserInterface::DoEvents() { log_.Add({{"ev", "doevents"}}); }
 
 std::string RootName(platform::RootKey root) {
   switch (root) {
-    case platform::RootKey::LocalMachine: return "HKLM";
-    case platform::RootKey::CurrentUser: return "HKCU";
+    case platform::RootKey::LocalMachine:
+      return "HKLM";
+    case platform::RootKey::CurrentUser:
+      return "HKCU";
   }
   return "0x" + std::to_string(static_cast<uint32_t>(root));
 }
 
 std::string RegistryTypeName(uint32_t type) {
   switch (type) {
-    case platform::kRegSz: return "REG_SZ";
-    case platform::kRegBinary: return "REG_BINARY";
-    case platform::kRegDword: return "REG_DWORD";
-    default: return "type " + std::to_string(type);
+    case platform::kRegSz:
+      return "REG_SZ";
+    case platform::kRegBinary:
+      return "REG_BINARY";
+    case platform::kRegDword:
+      return "REG_DWORD";
+    default:
+      return "type " + std::to_string(type);
   }
 }
 
@@ -158,9 +168,9 @@ bool RecordingRegistry::SetValue(platform::RootKey root, std::string_view key, s
 
 platform::KeyDisposition RecordingRegistry::CreateKey(platform::RootKey root, std::string_view key) {
   const platform::KeyDisposition d = inner_.CreateKey(root, key);
-  const char* name = d == platform::KeyDisposition::Created ? "created"
+  const char* name = d == platform::KeyDisposition::Created  ? "created"
                      : d == platform::KeyDisposition::Opened ? "opened"
-                                                              : "failed";
+                                                             : "failed";
   log_.Add({{"ev", "registry-create"}, {"root", RootName(root)}, {"key", key}, {"disposition", name}});
   return d;
 }
@@ -202,7 +212,9 @@ bool RecordingFileSystem::AppendText(std::string_view path, std::string_view tex
   return ok;
 }
 
-void FileSeeder::MakeFolder(std::string_view windowsPath) { std::filesystem::create_directories(hostPath_(windowsPath)); }
+void FileSeeder::MakeFolder(std::string_view windowsPath) {
+  std::filesystem::create_directories(hostPath_(windowsPath));
+}
 
 void FileSeeder::WriteFile(std::string_view windowsPath, std::string_view content) {
   const std::filesystem::path path = hostPath_(windowsPath);

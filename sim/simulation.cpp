@@ -98,8 +98,10 @@ void Simulation::Apply(const Action& a) {
       break;
     case Action::Type::SetFile:
       for (const auto& [path, content] : a.files) {
-        if (content) env_.seeder.WriteFile(path, *content);
-        else env_.seeder.RemoveFile(path);
+        if (content)
+          env_.seeder.WriteFile(path, *content);
+        else
+          env_.seeder.RemoveFile(path);
       }
       logWorld("setFile");
       break;
@@ -135,7 +137,9 @@ void Simulation::Call(const Action& a) {
   const uint64_t before = log_.hostCalls();
   try {
     const Variant result = api_->Invoke(api_->IdOfName(a.member), a.kind, args);
-    EventJson ev{{"ev", "result"}, {"member", a.member}, {"value", log_.Value(result)},
+    EventJson ev{{"ev", "result"},
+                 {"member", a.member},
+                 {"value", log_.Value(result)},
                  {"hostCalls", log_.hostCalls() - before}};
     if (!byRef.empty()) {
       EventJson written = EventJson::object();
@@ -145,7 +149,10 @@ void Simulation::Call(const Action& a) {
     log_.Add(std::move(ev));
   } catch (...) {
     const AutomationError e = CurrentError();
-    log_.Add({{"ev", "error"}, {"member", a.member}, {"number", e.number()}, {"description", e.description()},
+    log_.Add({{"ev", "error"},
+              {"member", a.member},
+              {"number", e.number()},
+              {"description", e.description()},
               {"hostCalls", log_.hostCalls() - before}});
   }
 }

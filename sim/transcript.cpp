@@ -8,6 +8,14 @@ namespace kpx::sim {
 
 namespace {
 
+// A field of an event, null when the event lacks it: the transcript must read
+// any log, including events of kinds it does not know.
+const EventJson& F(const EventJson& e, const char* key) {
+  static const EventJson kNull;
+  auto it = e.find(key);
+  return it == e.end() ? kNull : *it;
+}
+
 std::string Str(const EventJson& e, const char* key) {
   auto it = e.find(key);
   if (it == e.end() || it->is_null()) return {};
@@ -15,22 +23,31 @@ std::string Str(const EventJson& e, const char* key) {
 }
 
 // Quotes text for people: Windows paths keep their single backslashes.
+uint64_t Count(const EventJson& v) { return v.is_number_unsigned() ? v.get<uint64_t>() : 0; }
+
 std::string Quoted(const std::string& s) {
   std::string out = "\"";
   for (char c : s) {
-    if (c == '"') out += "\\\"";
-    else if (c == '\r') out += "\\r";
-    else if (c == '\n') out += "\\n";
-    else out += c;
+    if (c == '"')
+      out += "\\\"";
+    else if (c == '\r')
+      out += "\\r";
+    else if (c == '\n')
+      out += "\\n";
+    else
+      out += c;
   }
   return out + "\"";
 }
 
 std::string ErrorText(const EventJson& error) {
+  if (!error.is_object()) return "?";
   const int64_t number = error.value("number", int64_t{0});
   char num[32];
-  if (number < 0) std::snprintf(num, sizeof num, "0x%08X", static_cast<unsigned>(static_cast<uint32_t>(number)));
-  else std::snprintf(num, sizeof num, "%lld", static_cast<long long>(number));
+  if (number < 0)
+    std::snprintf(num, sizeof num, "0x%08X", static_cast<unsigned>(static_cast<uint32_t>(number)));
+  else
+    std::snprintf(num, sizeof num, "%lld", static_cast<long long>(number));
   return std::string(num) + " " + Str(error, "description");
 }
 
@@ -79,9 +96,10 @@ std::string ShortValue(const EventJson& v) {
 
 std::string TranscriptLine(const EventJson& e) {
   const std::string ev = Str(e, "ev");
-  const std::string hostCalls = e.contains("hostCalls") ? "   [" + Plural(e["hostCalls"].get<uint64_t>(), "host call", "host calls") + "]" : "";
+  const std::string hostCalls =
+      e.contains("hostCalls") ? "   [" + Plural(Count(F(e, "hostCalls")), "host call", "host calls") + "]" : "";
   if (ev == "create")
-    return Line("create", e.value("ok", false) ? "add-in object created" : "FAILED " + ErrorText(e["error"]));
+    return Line("create", e.value("ok", false) ? "add-in object created" : "FAILED " + ErrorText(F(e, "error")));
   if (ev == "release") {
     std::string text = e.value("implicit", false) ? "add-in object released at the end" : "add-in object released";
     if (e.contains("skipped")) text = "nothing to release";
@@ -89,31 +107,35 @@ std::string TranscriptLine(const EventJson& e) {
   }
   if (ev == "object-create") {
     const std::string how = e.contains("progid") ? "CreateObject(" + Str(e, "progid") + ")" : "New " + Str(e, "clsid");
-    return Line("object", e.value("ok", false) ? Str(e, "instance") + " = " + how : how + " FAILED " + ErrorText(e["error"]));
+    return Line("object",
+                e.value("ok", false) ? Str(e, "instance") + " = " + how : how + " FAILED " + ErrorText(F(e, "error")));
   }
-  if (ev == "call") return Line("call", Str(e, "member") + "(" + Args(e["args"]) + ")");
+  if (ev == "call") return Line("call", Str(e, "member") + "(" + Args(F(e, "args")) + ")");
   if (ev == "result") {
-    std::string text = Str(e, "member") + " = " + ShortValue(e["value"]);
+    std::string text = Str(e, "member") + " = " + ShortValue(F(e, "value"));
     if (e.contains("byref"))
-      for (const auto& [pos, value] : e["byref"].items()) text += ", arg " + pos + " = " + ShortValue(value);
+      for (const auto& [pos, value] : F(e, "byref").items()) text += ", arg " + pos + " = " + ShortValue(value);
     return Line("result", text + hostCalls);
   }
   if (ev == "error") return Line("error", Str(e, "member") + " raised " + ErrorText(e) + hostCalls);
   if (ev == "skip") return Line("skip", Str(e, "member") + " (" + Str(e, "reason") + ")");
   if (ev == "registry-read") {
     const std::string value =
-        e["value"].is_null() ? "(missing)" : RegistryValueText(e["value"]) + " (" + Str(e, "type") + ")";
+        F(e, "value").is_null() ? "(missing)" : RegistryValueText(F(e, "value")) + " (" + Str(e, "type") + ")";
     return Line("reg read", RegistryPlace(e) + " = " + value);
   }
   if (ev == "registry-write")
-    return Line("reg write", RegistryPlace(e) + " := " + RegistryValueText(e["value"]) + " (" + Str(e, "type") + ")" +
-                                 (e.value("written", false) ? "" : " NOT WRITTEN"));
-  if (ev == "registry-create") return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition"));
-  if (ev == "file-exists") return Line("file", "exists " + Str(e, "path") + "? " + (e.value("exists", false) ? "yes" : "no"));
+    return Line("reg write", RegistryPlace(e) + " := " + RegistryValueText(F(e, "value")) + " (" + Str(e, "type") +
+                                 ")" + (e.value("written", false) ? "" : " NOT WRITTEN"));
+  if (ev == "registry-create")
+    return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition"));
+  if (ev == "file-exists")
+    return Line("file", "exists " + Str(e, "path") + "? " + (e.value("exists", false) ? "yes" : "no"));
   if (ev == "file-delete")
     return Line("file", "delete " + Str(e, "path") + (e.value("ok", false) ? "" : " (nothing deleted)"));
   if (ev == "file-append")
-    return Line("file", "append " + Str(e, "path") + " " + Quoted(Str(e, "text")) + (e.value("ok", false) ? "" : " FAILED"));
+    return Line("file",
+                "append " + Str(e, "path") + " " + Quoted(Str(e, "text")) + (e.value("ok", false) ? "" : " FAILED"));
   if (ev == "debuglog") return Line("log", Str(e, "line") + (e.value("ok", false) ? "" : "   [not written]"));
   if (ev == "sleep") return Line("sleep", Str(e, "ms") + " ms");
   if (ev == "doevents") return Line("doevents", "");
@@ -129,36 +151,38 @@ std::string TranscriptLine(const EventJson& e) {
     return Line("menu", Str(e, "addin") + " add [" + Str(e, "itemType") + "] " + Quoted(Str(e, "caption")) +
                             (Str(e, "name").empty() ? "" : " " + Str(e, "name")));
   if (ev == "menu-state")
-    return Line("menu", Str(e, "addin") + " " + Str(e, "name") + ".MenuState := " + ShortValue(e["value"]));
+    return Line("menu", Str(e, "addin") + " " + Str(e, "name") + ".MenuState := " + ShortValue(F(e, "value")));
   if (ev == "setting-read")
     return Line("setting", Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " -> " +
                                Quoted(Str(e, "value")) + (e.value("found", false) ? "" : " (default)"));
   if (ev == "setting-write")
-    return Line("setting", Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " := " +
-                               Quoted(Str(e, "value")));
+    return Line("setting",
+                Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " := " + Quoted(Str(e, "value")));
   if (ev == "companion-call") {
     std::string text = Str(e, "instance") + ".";
-    if (e.contains("member")) text += Str(e, "member");
-    else text += "operation " + Str(e, "operation");
-    if (e.contains("args")) text += "(" + Args(e["args"]) + ")";
-    if (e.contains("error")) return Line("companion", text + " raised " + ErrorText(e["error"]));
-    text += " = " + ShortValue(e["result"]);
+    if (e.contains("member"))
+      text += Str(e, "member");
+    else
+      text += "operation " + Str(e, "operation");
+    if (e.contains("args")) text += "(" + Args(F(e, "args")) + ")";
+    if (e.contains("error")) return Line("companion", text + " raised " + ErrorText(F(e, "error")));
+    text += " = " + ShortValue(F(e, "result"));
     if (e.contains("byref"))
-      for (const auto& [pos, value] : e["byref"].items()) text += ", arg " + pos + " = " + ShortValue(value);
+      for (const auto& [pos, value] : F(e, "byref").items()) text += ", arg " + pos + " = " + ShortValue(value);
     return Line("companion", text);
   }
   if (ev == "script")
-    return Line("script", Str(e, "path") + (e.contains("error") ? " FAILED " + ErrorText(e["error"]) : ""));
+    return Line("script", Str(e, "path") + (e.contains("error") ? " FAILED " + ErrorText(F(e, "error")) : ""));
   if (ev == "element-write") {
     std::string text = Str(e, "element") + "." + Str(e, "member");
     if (e.contains("tool")) text += "(" + Str(e, "tool") + ", " + Str(e, "property") + ")";
-    return Line("model", text + " := " + ShortValue(e["value"]));
+    return Line("model", text + " := " + ShortValue(F(e, "value")));
   }
   if (ev == "world") {
     for (const auto& [key, value] : e.items())
       if (key != "ev") return Line("world", key + " " + value.dump());
   }
-  if (ev == "unused-answers") return Line("world", "answers never used: " + e["buttons"].dump());
+  if (ev == "unused-answers") return Line("world", "answers never used: " + F(e, "buttons").dump());
   return Line(ev.c_str(), e.dump());
 }
 
@@ -169,8 +193,8 @@ std::string Transcript(const std::vector<EventJson>& events, const std::string& 
   std::vector<std::string> members;
   std::map<std::string, uint64_t> calls, hostCalls, errors;
   std::vector<std::string> addins, debugLines;
-  uint64_t regRead = 0, regMissing = 0, regWritten = 0, keysCreated = 0, hostLog = 0, companionCalls = 0,
-           deletes = 0, appends = 0, objects = 0, failedObjects = 0, debugFailed = 0;
+  uint64_t regRead = 0, regMissing = 0, regWritten = 0, keysCreated = 0, hostLog = 0, companionCalls = 0, deletes = 0,
+           appends = 0, objects = 0, failedObjects = 0, debugFailed = 0;
   for (const EventJson& e : events) {
     out << TranscriptLine(e) << '\n';
     const std::string ev = Str(e, "ev"), member = Str(e, "member");
@@ -178,13 +202,13 @@ std::string Transcript(const std::vector<EventJson>& events, const std::string& 
       if (!calls.count(member)) members.push_back(member);
       ++calls[member];
     } else if (ev == "result" || ev == "error") {
-      hostCalls[member] += e["hostCalls"].get<uint64_t>();
+      hostCalls[member] += Count(F(e, "hostCalls"));
       if (ev == "error") ++errors[member];
     } else if (ev == "addin") {
       addins.push_back(Str(e, "addin") + "." + Str(e, "action"));
     } else if (ev == "registry-read") {
       ++regRead;
-      if (e["value"].is_null()) ++regMissing;
+      if (F(e, "value").is_null()) ++regMissing;
     } else if (ev == "registry-write") {
       if (e.value("written", false)) ++regWritten;
     } else if (ev == "registry-create") {
@@ -200,8 +224,10 @@ std::string Transcript(const std::vector<EventJson>& events, const std::string& 
     } else if (ev == "object-create") {
       ++(e.value("ok", false) ? objects : failedObjects);
     } else if (ev == "debuglog") {
-      if (e.value("ok", false)) debugLines.push_back(Str(e, "line"));
-      else ++debugFailed;
+      if (e.value("ok", false))
+        debugLines.push_back(Str(e, "line"));
+      else
+        ++debugFailed;
     }
   }
 

@@ -10,11 +10,10 @@ namespace kpx::sim {
 
 World::World(const ModelDef& def, EventLog& log) : def_(def), log_(log), selection_(def.selection) {
   for (const AddInDef& a : def.addins) addins_.push_back(std::make_shared<AddInObject>(*this, a));
-  auto collection =
-      std::make_shared<CollectionObject>(*this, "$app.AddIns", std::vector<ObjectPtr>(addins_.begin(), addins_.end()),
-                                         false);
-  application_ =
-      std::make_shared<ApplicationObject>(*this, def.application, std::make_shared<AddInManagerObject>(*this, collection));
+  auto collection = std::make_shared<CollectionObject>(*this, "$app.AddIns",
+                                                       std::vector<ObjectPtr>(addins_.begin(), addins_.end()), false);
+  application_ = std::make_shared<ApplicationObject>(*this, def.application,
+                                                     std::make_shared<AddInManagerObject>(*this, collection));
   model_ = std::make_shared<ModelObject>(*this);
   for (const ElementDef& e : def.elements) elements_.push_back(std::make_shared<ElementObject>(*this, e));
 }

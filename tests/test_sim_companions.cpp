@@ -95,9 +95,9 @@ TEST_F(SimCompanionTest, ByReferenceArgumentsAreWrittenBackOnlyWhereAsked) {
   Variant first("one"), second("two"), third(3);
   const Variant result = CallByName(c, "Pick", CallKind::Method,
                                     {Variant::Ref(&first), Variant::Ref(&second), Variant(third), Variant(4)});
-  EXPECT_EQ(Variant("one"), first);   // {"keep": true}
+  EXPECT_EQ(Variant("one"), first);  // {"keep": true}
   EXPECT_EQ(Variant("written"), second);
-  EXPECT_EQ(Variant(3), third);       // passed by value: nothing to write to
+  EXPECT_EQ(Variant(3), third);  // passed by value: nothing to write to
   EXPECT_EQ("element:CFoo", w.log().Label(result.toObject().get()));
   const EventJson call = w.Events("companion-call").at(0);
   EXPECT_EQ((EventJson{{"byref", "one"}}), call["args"][0]);

@@ -77,8 +77,7 @@ TEST(SimModelFaults, EachFaultNamesTheLineOfTheOffendingValue) {
       {"{\"companions\": [{\"progid\": \"P\", \"members\": {\n \"Go\": {\"returns\": {\"element\": \"Nope\"}},\n "
        "\"Stop\": {}\n}}]}",
        2, "no element \"Nope\""},
-      {"{\"companions\": [{\"progid\": \"P\", \"members\": {\n \"Go\": {},\n \"go\": {}\n}}]}", 3,
-       "names ignore case"},
+      {"{\"companions\": [{\"progid\": \"P\", \"members\": {\n \"Go\": {},\n \"go\": {}\n}}]}", 3, "names ignore case"},
       {"{\"companions\": [{\"progid\": \"P\", \"members\": {\n \"Go\": {\"returns\": 1,\n  \"raise\": "
        "{\"number\": 5}}\n}}]}",
        3, "either returns or raises"},
@@ -139,7 +138,8 @@ TEST(SimModelElements, MembersGetQualifiedKeysAndRelationsDefaultTheirText) {
 }
 
 TEST(SimModelAddIns, NamesakesAreNumberedInListOrder) {
-  const ModelDef m = ParseModel(R"({"addins": [{"name": "VisualStudio"}, {"name": "VC++"}, {"name": "VisualStudio"}]})");
+  const ModelDef m =
+      ParseModel(R"({"addins": [{"name": "VisualStudio"}, {"name": "VC++"}, {"name": "VisualStudio"}]})");
   ASSERT_EQ(3u, m.addins.size());
   EXPECT_EQ("VisualStudio", m.addins[0].id);
   EXPECT_EQ("VC++", m.addins[1].id);
@@ -192,8 +192,9 @@ TEST(SimScenarioFaults, ArgumentValuesAreChecked) {
                              &message));
   EXPECT_THAT(message, HasSubstr("no element \"CBar\""));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"call\": \"OnActivate\", \"args\": [{\"i2\": 40000}]}]}", &message));
-  EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"call\": \"OnActivate\", \"args\": [{\"addin\": \"VisualStudio\"}]}]}",
-                             &message));
+  EXPECT_EQ(2,
+            ScenarioFault("{\"actions\": [\n {\"call\": \"OnActivate\", \"args\": [{\"addin\": \"VisualStudio\"}]}]}",
+                          &message));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"call\": \"OnActivate\", \"args\": [{\"byref\": {\"byref\": 1}}]}]}",
                              &message));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"call\": \"OnActivate\", \"args\": [[1]]}]}", &message));
@@ -208,7 +209,8 @@ TEST(SimScenarioFaults, TheAddInObjectsLifeIsChecked) {
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [{\"call\": \"Name\"},\n {\"create\": true}]}", &message));
   EXPECT_THAT(message, HasSubstr("exists already"));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [{\"release\": true},\n {\"release\": true}]}", &message));
-  EXPECT_EQ(-1, ScenarioFault(R"({"actions": [{"create": true}, {"release": true}, {"create": true}, {"call": "Name"}]})"));
+  EXPECT_EQ(-1,
+            ScenarioFault(R"({"actions": [{"create": true}, {"release": true}, {"create": true}, {"call": "Name"}]})"));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"call\": \"Name\", \"select\": [\"CFoo\"]}]}", &message));
   EXPECT_THAT(message, HasSubstr("one action per entry"));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"selec\": [\"CFoo\"]}]}", &message));

@@ -1,9 +1,9 @@
 // Whole runs of the simulated host: values in and out, the add-in object's
 // life, the virtual clock, the recorded platform and the transcript.
-#include <algorithm>
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include <algorithm>
 
 #include "sim/transcript.h"
 #include "sim/values.h"
@@ -113,7 +113,8 @@ TEST(SimRun, TheRunReleasesWhatTheScenarioLeftAliveAndReportsUnusedAnswers) {
   ASSERT_NE(events.end(), release);
   EXPECT_TRUE((*release)["implicit"].get<bool>());
   // The add-in object's own release routine still ran after it.
-  EXPECT_NE(events.end(), std::find_if(release, events.end(), [](const EventJson& e) { return e["ev"] == "doevents"; }));
+  EXPECT_NE(events.end(),
+            std::find_if(release, events.end(), [](const EventJson& e) { return e["ev"] == "doevents"; }));
   EXPECT_EQ((EventJson{{"ev", "unused-answers"}, {"buttons", {6}}}), events.back());
   EXPECT_EQ((EventJson{{"ev", "world"}, {"answer", {{"button", 6}}}}), events[2]);
   EXPECT_EQ(nullptr, w.sim().api());
@@ -163,9 +164,11 @@ TEST(SimPlatform, AppendsToTheDebugLogAreToldApartWhateverTheCase) {
 TEST(SimPlatform, RegistryEffectsAreRecordedWithTheirOutcome) {
   SimWorld w(kWorld);
   platform::Registry& reg = w.sim().platform().registry;
-  EXPECT_FALSE(reg.SetValue(platform::RootKey::CurrentUser, "Software\\Nope", "V", {platform::kRegSz, std::string("x\0", 2)}));
+  EXPECT_FALSE(
+      reg.SetValue(platform::RootKey::CurrentUser, "Software\\Nope", "V", {platform::kRegSz, std::string("x\0", 2)}));
   EXPECT_EQ(platform::KeyDisposition::Created, reg.CreateKey(platform::RootKey::CurrentUser, "Software\\Nope"));
-  EXPECT_TRUE(reg.SetValue(platform::RootKey::CurrentUser, "Software\\Nope", "", {platform::kRegDword, std::string("\xff\0\0\x80", 4)}));
+  EXPECT_TRUE(reg.SetValue(platform::RootKey::CurrentUser, "Software\\Nope", "",
+                           {platform::kRegDword, std::string("\xff\0\0\x80", 4)}));
   EXPECT_FALSE(reg.QueryValue(platform::RootKey::LocalMachine, "Software\\Nope", "").has_value());
   const std::vector<EventJson> writes = w.Events("registry-write");
   ASSERT_EQ(2u, writes.size());
@@ -208,11 +211,18 @@ TEST(SimTranscript, LinesReadAsTheEventsMean) {
   EXPECT_EQ("$app", ShortValue({{"object", "$app"}}));
   EXPECT_EQ("byref \"C:\\x\"", ShortValue({{"byref", "C:\\x"}}));
   EXPECT_EQ("{\"i2\":4}", ShortValue({{"i2", 4}}));
-  EXPECT_THAT(TranscriptLine({{"ev", "error"}, {"member", "OnUser1"}, {"number", -2147467263},
-                              {"description", "not there"}, {"hostCalls", 1}}),
+  EXPECT_THAT(TranscriptLine({{"ev", "error"},
+                              {"member", "OnUser1"},
+                              {"number", -2147467263},
+                              {"description", "not there"},
+                              {"hostCalls", 1}}),
               HasSubstr("OnUser1 raised 0x80004001 not there   [1 host call]"));
-  EXPECT_THAT(TranscriptLine({{"ev", "registry-read"}, {"root", "HKCU"}, {"key", "K"}, {"name", ""},
-                              {"type", nullptr}, {"value", nullptr}}),
+  EXPECT_THAT(TranscriptLine({{"ev", "registry-read"},
+                              {"root", "HKCU"},
+                              {"key", "K"},
+                              {"name", ""},
+                              {"type", nullptr},
+                              {"value", nullptr}}),
               HasSubstr("HKCU\\K  @ = (missing)"));
   const std::string text = Transcript({{{"ev", "call"}, {"member", "Name"}, {"args", EventJson::array()}},
                                        {{"ev", "result"}, {"member", "Name"}, {"value", "VC++"}, {"hostCalls", 3}},

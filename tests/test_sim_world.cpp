@@ -63,9 +63,9 @@ class SimWorldTest : public ::testing::Test {
 
 TEST_F(SimWorldTest, EveryCallIntoAHostObjectCountsCompanionsDoNot) {
   const uint64_t start = w.log().hostCalls();
-  ObjectPtr manager = GetObject(app(), id::kAddInManager);  // 1
-  ObjectPtr addins = GetObject(manager, id::kAddIns);         // 2
-  app()->IdOfName("GetMainWnd");                              // 3
+  ObjectPtr manager = GetObject(app(), id::kAddInManager);        // 1
+  ObjectPtr addins = GetObject(manager, id::kAddIns);             // 2
+  app()->IdOfName("GetMainWnd");                                  // 3
   EXPECT_THROW(app()->IdOfName("NoSuchThing"), AutomationError);  // 4: a failed lookup is a call too
   EXPECT_EQ(start + 4, w.log().hostCalls());
   ObjectPtr handler = CallByName(addin("Plain"), "EventHandler", CallKind::PropertyGet).toObject();  // 6
@@ -112,9 +112,10 @@ TEST_F(SimWorldTest, AddInSettingsAreReadWithDefaultsAndWrittenBack) {
 
 TEST_F(SimWorldTest, MenuEntriesStartAsTheModelSaysAndRecordTheExactValueWritten) {
   ObjectPtr vc = addin("VC++");
-  ObjectPtr update = CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Update Code", "CClass_UpdateCode"})
-                         .toObject();
-  ObjectPtr other = CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Browse", "CClass_Browse"}).toObject();
+  ObjectPtr update =
+      CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Update Code", "CClass_UpdateCode"}).toObject();
+  ObjectPtr other =
+      CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Browse", "CClass_Browse"}).toObject();
   EXPECT_EQ(Variant(true), CallByName(update, "MenuState", CallKind::PropertyGet));
   EXPECT_TRUE(CallByName(other, "menustate", CallKind::PropertyGet).isEmpty());
   PutProperty(other, other->IdOfName("MenuState"), Variant(int16_t{-1}));
@@ -175,9 +176,9 @@ TEST_F(SimWorldTest, ClassQueriesFollowTheModel) {
   EXPECT_FALSE(CallMethod(circle, id::kIsNested).toBool());
   EXPECT_EQ("element:Circle", LabelOf(GetProperty(element("Inner"), id::kEnclosingClass)));
   EXPECT_TRUE(GetProperty(circle, id::kEnclosingClass).isNothing());
-  EXPECT_EQ("Meta", CallByName(CallByName(circle, "ClassKind", CallKind::PropertyGet).toObject(), "Name",
-                               CallKind::PropertyGet)
-                        .toString());
+  EXPECT_EQ("Meta",
+            CallByName(CallByName(circle, "ClassKind", CallKind::PropertyGet).toObject(), "Name", CallKind::PropertyGet)
+                .toString());
   EXPECT_FALSE(CallMethod(CallMethod(circle, id::kGetClassKind).toObject(), id::kKindTest).toBool());
   EXPECT_TRUE(CallMethod(CallMethod(element("IShape"), id::kGetClassKind).toObject(), id::kKindTest).toBool());
   ObjectPtr components = CallMethod(element("IShape"), id::kGetAssignedComponents).toObject();
@@ -189,8 +190,9 @@ TEST_F(SimWorldTest, ClassQueriesFollowTheModel) {
   EXPECT_EQ("element:Circle", LabelOf(CallMethod(realizing, id::kGetAt, {Variant(int16_t{1})})));
   ObjectPtr depending = CallByName(circle, "GetRelatedClasses", CallKind::Method, {0, 5}).toObject();
   EXPECT_EQ("element:CCircle", LabelOf(CallMethod(depending, id::kGetAt, {Variant(int16_t{1})})));
-  EXPECT_EQ(0, GetProperty(CallByName(circle, "GetRelatedClasses", CallKind::Method, {0, 6}).toObject(), id::kCount)
-                   .toInt16());
+  EXPECT_EQ(
+      0,
+      GetProperty(CallByName(circle, "GetRelatedClasses", CallKind::Method, {0, 6}).toObject(), id::kCount).toInt16());
 }
 
 TEST_F(SimWorldTest, DeletedInheritRelationsLeaveTheClass) {
@@ -237,8 +239,8 @@ TEST_F(SimWorldTest, PropertiesAndNamesChangeAndAreRecorded) {
   EXPECT_EQ("custom", CallMethod(shape, id::kGetPropertyValue, {"VC++", "ImplType"}).toString());
   PutProperty(shape, id::kName, Variant("IFigure"));
   EXPECT_EQ("IFigure", GetProperty(shape, id::kName).toString());
-  EXPECT_EQ("False", CallMethod(GetObject(app(), id::kCurrentModel), id::kGetPropertyValue, {"VC++", "Scripting"})
-                         .toString());
+  EXPECT_EQ("False",
+            CallMethod(GetObject(app(), id::kCurrentModel), id::kGetPropertyValue, {"VC++", "Scripting"}).toString());
   const std::vector<EventJson> writes = w.Events("element-write");
   ASSERT_EQ(4u, writes.size());
   EXPECT_FALSE(writes[0]["created"].get<bool>());
