@@ -23,7 +23,9 @@ std::string Str(const EventJson& e, const char* key) {
 }
 
 // Quotes text for people: Windows paths keep their single backslashes.
-uint64_t Count(const EventJson& v) { return v.is_number_unsigned() ? v.get<uint64_t>() : 0; }
+uint64_t Count(const EventJson& v) {
+  return v.is_number_integer() && v.get<int64_t>() >= 0 ? v.get<uint64_t>() : 0;
+}
 
 std::string Quoted(const std::string& s) {
   std::string out = "\"";
