@@ -615,6 +615,20 @@ void PlatformOverWin32(const Paths& paths) {
   CHECK_EQ(late->IdOfOwnOperation(2), 2);
   CHECK_EQ(ErrorNumber([&] { late->IdOfOwnOperation(3); }), kpx::vberr::kNoSuchMember);
 
+  // A plain dispinterface counts its own operations in declaration order.
+  kpx::ObjectPtr api = world.objects.CreateObject("kpxAddIn.API");
+  CHECK_EQ(api->IdOfOwnOperation(1), 1);
+  CHECK_EQ(api->IdOfOwnOperation(20), 20);
+  CHECK_EQ(ErrorNumber([&] { api->IdOfOwnOperation(70); }), kpx::vberr::kNoSuchMember);
+  CHECK_EQ(kpx::CallOwnOperation(api, 18, kpx::CallKind::PropertyGet).toString(), std::string("VC++"));
+  api.reset();
+  // By class id and interface id, as the add-in makes its companions.
+  kpx::ObjectPtr scanner =
+      world.objects.CreateInstance(kpx::win32::GuidToString(CLSID_TokenScanner), kpx::win32::GuidToString(DIID__TokenScanner));
+  CHECK(kpx::CallByName(scanner, "Init", kpx::CallKind::Method, {kpx::Variant("x y"), kpx::Variant("| ")}).toBool());
+  CHECK_EQ(kpx::CallByName(scanner, "NextToken", kpx::CallKind::Method).toString(), std::string("x"));
+  scanner.reset();
+
   CHECK_EQ(ErrorNumber([&] { world.objects.CreateObject("kpx.NoSuchComponent"); }, &description),
            kpx::vberr::kCantCreateObject);
   CHECK(!description.empty());

@@ -30,7 +30,11 @@ for arch in x64 x86; do
   else
     cmake -S . -B "$dir" -DCMAKE_TOOLCHAIN_FILE="$toolchain" -DCMAKE_BUILD_TYPE=Release >/dev/null
   fi
-  cmake --build "$dir" -j "$(nproc 2>/dev/null || echo 2)" --target kpx-wintest >/dev/null
+  if ! cmake --build "$dir" -j "$(nproc 2>/dev/null || echo 2)" --target kpx-wintest >"$BUILD/wintest-build-$arch.log" 2>&1; then
+    tail -40 "$BUILD/wintest-build-$arch.log"
+    echo "wintest: the $arch build failed"
+    exit 1
+  fi
 done
 
 export WINEPREFIX="$(realpath -m "$BUILD/wine-prefix")"
