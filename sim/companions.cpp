@@ -82,8 +82,10 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
     RecordFailure(std::move(call), error);
     throw error;
   }
-  if (member->raise) {
-    const AutomationError error(member->raise->number, member->raise->description);
+  const AnswerDef* answer = FindAnswer(*member, args);
+  const std::optional<ErrorDef>& raise = answer ? answer->raise : member->raise;
+  if (raise) {
+    const AutomationError error(raise->number, raise->description);
     RecordFailure(std::move(call), error);
     throw error;
   }
@@ -94,14 +96,32 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
     written[std::to_string(i + 1)] = log.Value(args[i]);
   }
   Variant result;
-  if (member->returnsObject)
+  if (answer) {
+    if (answer->returns) result = world_.ToVariant(*answer->returns, this);
+  } else if (member->returnsObject) {
     result = ReturnedObject(name, member->returnsObject);
-  else if (member->returns)
+  } else if (member->returns) {
     result = world_.ToVariant(*member->returns, this);
+  }
   call["result"] = log.Value(result);
   if (!written.empty()) call["byref"] = std::move(written);
   log.Add(std::move(call));
   return result;
+}
+
+// The first answer whose arguments all equal the call's leading arguments,
+// compared as the log writes them (so objects compare by identity, numbers
+// by type and value, and a by-reference argument by what it refers to).
+const AnswerDef* CompanionObject::FindAnswer(const MemberDef& member, std::span<const Variant> args) {
+  const EventLog& log = world_.log();
+  for (const AnswerDef& answer : member.answers) {
+    if (answer.args.size() > args.size()) continue;
+    bool same = true;
+    for (size_t i = 0; same && i < answer.args.size(); ++i)
+      same = log.Value(args[i]) == log.Value(world_.ToVariant(answer.args[i], this));
+    if (same) return &answer;
+  }
+  return nullptr;
 }
 
 ObjectPtr CompanionObject::SubObject(const std::string& name) {

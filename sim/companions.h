@@ -33,6 +33,7 @@ class CompanionObject final : public SimObject {
   ObjectPtr SubObject(const std::string& name);
 
  private:
+  const AnswerDef* FindAnswer(const MemberDef& member, std::span<const Variant> args);
   ObjectPtr ReturnedObject(const std::string& member, const std::shared_ptr<const CompanionDef>& def);
   void RecordFailure(EventJson call, const AutomationError& error);
 

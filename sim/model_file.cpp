@@ -545,7 +545,7 @@ class ModelReader {
   }
 
   MemberDef ReadMember(const Node& n, const CompanionDef& owner) {
-    n.ExpectKeys({"comment", "returns", "raise", "setArgs"});
+    n.ExpectKeys({"comment", "returns", "raise", "setArgs", "answers"});
     MemberDef m;
     if (auto r = n.Find("returns")) {
       if (r->IsObject() && r->json().size() == 1 && r->json().contains("companion"))
@@ -562,7 +562,27 @@ class ModelReader {
         if (!(v.IsObject() && v.json().size() == 1 && v.json().contains("keep"))) CheckValue(v, m_, &owner, false);
         m.setArgs.push_back(v.json());
       }
+    if (auto answers = n.Find("answers"))
+      for (const Node& a : answers->Elements()) m.answers.push_back(ReadAnswer(a, owner));
     return m;
+  }
+
+  // {"args": [values], "returns": value} or {"args": [...], "raise": {...}}
+  AnswerDef ReadAnswer(const Node& n, const CompanionDef& owner) {
+    n.ExpectObject("an answer {\"args\": [...], \"returns\": ...}");
+    n.ExpectKeys({"comment", "args", "returns", "raise"});
+    AnswerDef a;
+    for (const Node& v : n.Member("args").Elements()) {
+      CheckValue(v, m_, &owner, false);
+      a.args.push_back(v.json());
+    }
+    if (auto r = n.Find("returns")) {
+      CheckValue(*r, m_, &owner, false);
+      a.returns = r->json();
+    }
+    if (auto e = n.Find("raise")) a.raise = ParseError(*e);
+    if (a.raise && a.returns) n.Member("raise").Fail("an answer either returns or raises");
+    return a;
   }
 
   Node root_;

@@ -44,6 +44,13 @@ struct ClockSetting {
   std::optional<double> step;              // added after each Timer read
 };
 
+// What a member answers when a call's leading arguments are these values.
+struct AnswerDef {
+  std::vector<InputJson> args;       // compared with the call's first arguments (checked)
+  std::optional<InputJson> returns;  // a value (checked); Empty when neither is given
+  std::optional<ErrorDef> raise;
+};
+
 // A companion member: what a call answers.
 struct CompanionDef;
 struct MemberDef {
@@ -51,6 +58,7 @@ struct MemberDef {
   std::shared_ptr<const CompanionDef> returnsObject;  // or a companion of its own
   std::optional<ErrorDef> raise;
   std::vector<InputJson> setArgs;  // written back to by-reference arguments, by position
+  std::vector<AnswerDef> answers;  // tried in order before `returns` and `raise`
 };
 
 struct CompanionDef {

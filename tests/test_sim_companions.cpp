@@ -6,6 +6,7 @@
 #include "shared/resource_strings.h"
 #include "shared/resource_texts.h"
 #include "sim/companions.h"
+#include "sim/host_objects.h"
 #include "test_sim_support.h"
 
 namespace kpx::sim::test {
@@ -136,6 +137,93 @@ TEST_F(SimCompanionTest, ResourceTextsComeFromTheModelFirstAndAreNotRecorded) {
   const std::vector<EventJson> created = w.Events("object-create");
   ASSERT_EQ(2u, created.size());
   EXPECT_EQ("kpxres.KPXResourceInterface#2", created[1]["instance"]);
+}
+
+// A member whose answer depends on its arguments: a component check that
+// passes one component and fails another.
+const char* kAnsweringWorld = R"({
+  "model": {"elements": [{"kind": "Module", "name": "GoodLib"}, {"kind": "Module", "name": "BadLib"},
+                         {"kind": "Module", "name": "OddLib"}, {"kind": "Module", "name": "OtherLib"}]},
+  "companions": [
+    {"clsid": "{CFD996E3-1393-11D3-B9F3-006008BF3ACB}",
+     "operations": ["Init", "Terminate", "ShowComponentOptions", "CheckComponent"],
+     "members": {
+       "CheckComponent": {
+         "returns": true,
+         "answers": [
+           {"args": [{"element": "GoodLib"}], "returns": true},
+           {"args": [{"element": "BadLib"}], "returns": false},
+           {"args": [{"element": "BadLib"}], "returns": "never reached"},
+           {"args": [{"element": "OddLib"}, {"i2": 2}], "raise": {"number": 5, "description": "odd"}},
+           {"args": [{"element": "OddLib"}, "x"]}
+         ]},
+       "Count": {"answers": [{"args": [1], "returns": "one"}], "raise": {"number": 13}}
+     }}
+  ]
+})";
+
+class SimAnswerTest : public ::testing::Test {
+ protected:
+  SimWorld w{kAnsweringWorld};
+  ObjectPtr companion = w.sim().platform().objects.CreateInstance("{CFD996E3-1393-11D3-B9F3-006008BF3ACB}", "");
+  Variant Element(const char* key) { return Variant(ObjectPtr(w.world().FindElement(key))); }
+  Variant Check(std::initializer_list<Variant> args) {
+    return CallOwnOperation(companion, 4, CallKind::Method, args);
+  }
+};
+
+TEST_F(SimAnswerTest, TheFirstAnswerWhoseArgumentsMatchDecides) {
+  EXPECT_EQ(Variant(true), Check({Element("GoodLib"), Variant()}));
+  EXPECT_EQ(Variant(false), Check({Element("BadLib"), Variant()}));  // not the later "never reached"
+  // Unmatched arguments fall back to the member's own answer.
+  EXPECT_EQ(Variant(true), Check({Element("OtherLib"), Variant()}));
+  const std::vector<EventJson> calls = w.Events("companion-call");
+  ASSERT_EQ(3u, calls.size());
+  EXPECT_EQ(false, calls[1]["result"]);
+  EXPECT_EQ((EventJson::array({{{"object", "element:BadLib"}}, nullptr})), calls[1]["args"]);
+}
+
+TEST_F(SimAnswerTest, AnswersCompareEveryLeadingArgumentByTypeAndValue) {
+  Variant odd = Element("OddLib");
+  // A by-reference argument matches by what it refers to.
+  const AutomationError e = ErrorOf([&] { Check({Variant::Ref(&odd), Variant(int16_t{2})}); });
+  EXPECT_EQ(5, e.number());
+  EXPECT_EQ("odd", e.description());
+  EXPECT_EQ(Variant(true), Check({odd, Variant(2)}));  // a Long is not an Integer
+  EXPECT_EQ(Variant(true), Check({odd}));              // too few arguments to match
+  // An answer without "returns" or "raise" answers Empty.
+  EXPECT_TRUE(Check({odd, Variant("x"), Variant(9)}).isEmpty());
+  const std::vector<EventJson> calls = w.Events("companion-call");
+  ASSERT_EQ(4u, calls.size());
+  EXPECT_EQ(5, calls[0]["error"]["number"]);
+  EXPECT_EQ(nullptr, calls[3]["result"]);
+}
+
+TEST_F(SimAnswerTest, AnAnswerOverridesTheMembersRaise) {
+  EXPECT_EQ(Variant("one"), CallByName(companion, "Count", CallKind::Method, {Variant(1)}));
+  EXPECT_EQ(13, ErrorOf([&] { CallByName(companion, "Count", CallKind::Method, {Variant(2)}); }).number());
+}
+
+TEST(SimAnswerInput, FaultsInAnswersNameTheirLines) {
+  auto load = [](const std::string& answer) {
+    std::string message;
+    const int line = FaultLine(
+        [&] {
+          ParseModel(R"({"model": {"elements": [{"kind": "Module", "name": "GoodLib"}]},
+"companions": [{"progid": "p", "members": {"M": {"answers": [
+)" + answer + "]}}}]}");
+        },
+        &message);
+    return std::make_pair(line, message);
+  };
+  EXPECT_EQ(3, load(R"({"args": [{"element": "GoodLib"}], "returns": 1, "raise": {"number": 5}})").first);
+  EXPECT_EQ(3, load(R"({"args": [{"element": "NoSuchLib"}], "returns": 1})").first);
+  EXPECT_EQ(3, load(R"({"returns": 1})").first);  // "args" is required
+  EXPECT_EQ(3, load(R"({"args": [], "result": 1})").first);
+  EXPECT_EQ(3, load(R"({"args": {"element": "GoodLib"}})").first);
+  const auto [line, message] = load(R"({"args": [{"byref": 1}]})");
+  EXPECT_EQ(3, line) << message;
+  EXPECT_EQ(-1, load(R"({"args": [{"element": "GoodLib"}, null], "returns": {"i2": 1}, "comment": "ok"})").first);
 }
 
 TEST(SimResourceComponent, AnUnregisteredComponentFailsBothWays) {
