@@ -111,10 +111,12 @@ Variant CollectionObject::Call(DispId dispId, CallKind kind, std::span<Variant> 
 
 // ----------------------------------------------------------- MenuEntryObject
 
-MenuEntryObject::MenuEntryObject(World& world, std::string label, std::string addin, std::string name, Variant state)
+MenuEntryObject::MenuEntryObject(World& world, std::string label, std::string addin, int16_t itemType,
+                                 std::string name, Variant state)
     : HostObject(world),
       label_(std::move(label)),
       addin_(std::move(addin)),
+      itemType_(itemType),
       name_(std::move(name)),
       state_(std::move(state)) {}
 
@@ -129,7 +131,11 @@ Variant MenuEntryObject::Call(DispId, CallKind kind, std::span<Variant> args) {
     return state_;
   }
   state_ = PutValue(kind, args);
-  world_.log().Add({{"ev", "menu-state"}, {"addin", addin_}, {"name", name_}, {"value", world_.log().Value(state_)}});
+  world_.log().Add({{"ev", "menu-state"},
+                    {"addin", addin_},
+                    {"itemType", itemType_},
+                    {"name", name_},
+                    {"value", world_.log().Value(state_)}});
   return {};
 }
 
@@ -201,7 +207,7 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
       Variant state;
       if (auto s = def_.menuStates.find(name); s != def_.menuStates.end()) state = world_.ToVariant(s->second);
       return ObjectPtr(std::make_shared<MenuEntryObject>(
-          world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)), def_.id, name, state));
+          world_, world_.NextLabel("menu:" + (name.empty() ? caption : name)), def_.id, itemType, name, state));
     }
     case id::kHelpFile:
       Read(kind, args);

@@ -97,7 +97,8 @@ class CollectionObject final : public HostObject {
 
 class MenuEntryObject final : public HostObject {
  public:
-  MenuEntryObject(World& world, std::string label, std::string addin, std::string name, Variant state);
+  MenuEntryObject(World& world, std::string label, std::string addin, int16_t itemType, std::string name,
+                  Variant state);
   std::string label() const override { return label_; }
   const Variant& state() const { return state_; }
 
@@ -106,7 +107,9 @@ class MenuEntryObject final : public HostObject {
   Variant Call(DispId id, CallKind kind, std::span<Variant> args) override;
 
  private:
-  std::string label_, addin_, name_;
+  std::string label_, addin_;
+  int16_t itemType_;  // the menu it was added to: one name may be on several
+  std::string name_;
   Variant state_;
 };
 

@@ -153,7 +153,8 @@ std::string TranscriptLine(const EventJson& e) {
     return Line("menu", Str(e, "addin") + " add [" + Str(e, "itemType") + "] " + Quoted(Str(e, "caption")) +
                             (Str(e, "name").empty() ? "" : " " + Str(e, "name")));
   if (ev == "menu-state")
-    return Line("menu", Str(e, "addin") + " " + Str(e, "name") + ".MenuState := " + ShortValue(F(e, "value")));
+    return Line("menu", Str(e, "addin") + " [" + Str(e, "itemType") + "] " + Str(e, "name") +
+                            ".MenuState := " + ShortValue(F(e, "value")));
   if (ev == "setting-read")
     return Line("setting", Str(e, "addin") + " [" + Str(e, "section") + "] " + Str(e, "entry") + " -> " +
                                Quoted(Str(e, "value")) + (e.value("found", false) ? "" : " (default)"));

@@ -116,16 +116,24 @@ TEST_F(SimWorldTest, MenuEntriesStartAsTheModelSaysAndRecordTheExactValueWritten
       CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Update Code", "CClass_UpdateCode"}).toObject();
   ObjectPtr other =
       CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{4}), "Browse", "CClass_Browse"}).toObject();
+  // The same internal name on another menu is another entry.
+  ObjectPtr componentUpdate =
+      CallMethod(vc, id::kAddContextMenuItem, {Variant(int16_t{7}), "Update Code", "CClass_UpdateCode"}).toObject();
   EXPECT_EQ(Variant(true), CallByName(update, "MenuState", CallKind::PropertyGet));
   EXPECT_TRUE(CallByName(other, "menustate", CallKind::PropertyGet).isEmpty());
   PutProperty(other, other->IdOfName("MenuState"), Variant(int16_t{-1}));
   PutProperty(update, update->IdOfName("MenuState"), Variant(false));
+  PutProperty(componentUpdate, componentUpdate->IdOfName("MenuState"), Variant(true));
+  EXPECT_EQ(Variant(false), CallByName(update, "MenuState", CallKind::PropertyGet));
   const std::vector<EventJson> states = w.Events("menu-state");
-  ASSERT_EQ(2u, states.size());
+  ASSERT_EQ(3u, states.size());
   EXPECT_EQ((EventJson{{"i2", -1}}), states[0]["value"]);  // an Integer is not a Boolean
   EXPECT_EQ(EventJson(false), states[1]["value"]);
   EXPECT_EQ("CClass_UpdateCode", states[1]["name"]);
-  EXPECT_EQ(2u, w.Events("menu-add").size());
+  EXPECT_EQ(4, states[1]["itemType"]);
+  EXPECT_EQ("CClass_UpdateCode", states[2]["name"]);
+  EXPECT_EQ(7, states[2]["itemType"]);
+  EXPECT_EQ(3u, w.Events("menu-add").size());
   // A host without context menus has no such member, by id or by name.
   EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] {
               CallMethod(addin("Plain"), id::kAddContextMenuItem, {Variant(int16_t{4}), "a", "b"});
