@@ -28,6 +28,9 @@ class EventLog {
   // Appends an event; it must have its kind in "ev".
   void Add(EventJson event);
   const std::vector<EventJson>& events() const { return events_; }
+  // Drops the events recorded so far; the host-call count and the objects'
+  // labels stay. For long runs that read only the counts.
+  void Clear() { events_.clear(); }
 
   // Calls into host objects, counted so that each member's result can say
   // how many it made.
