@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <span>
 #include <vector>
 #include <string>
@@ -152,11 +153,13 @@ class API final : public Object {
   std::array<std::string, static_cast<size_t>(MenuText::Count)> menuTexts_;
   // Keyed collections; the host's keys compare without regard to case, as
   // the host's own collections do.
-  struct MenuEntry {
-    ObjectPtr object;
-    DispId menuState = 0;  // resolved on the first write, then reused
-  };
-  std::map<std::string, MenuEntry, NoCaseLess> MenuItems_;
+  std::map<std::string, ObjectPtr, NoCaseLess> MenuItems_;
+  // Ids of host members the menus reach by name. Every menu entry, and every
+  // class kind, is the same kind of host object, so one look-up per
+  // activation serves them all: each look-up is a round trip to the host.
+  struct HostNameIds {
+    std::optional<DispId> menuState, classKind, kindName;
+  } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
 
  public:

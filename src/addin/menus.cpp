@@ -93,13 +93,14 @@ std::vector<std::string> API::menuItemKeys() const {
 
 ObjectPtr API::menuItem(std::string_view key) const {
   auto it = MenuItems_.find(key);
-  return it == MenuItems_.end() ? nullptr : it->second.object;
+  return it == MenuItems_.end() ? nullptr : it->second;
 }
 
 // ------------------------------------------------------------------ catalogue
 
 bool API::BuildContextMenus(const ObjectPtr&, const ObjectPtr& addIn) {
   MenuItems_.clear();
+  hostNameIds_ = {};
   return CatchAll(
       [&] {
         for (const CatalogueRow& row : kCatalogue) {
@@ -107,7 +108,7 @@ bool API::BuildContextMenus(const ObjectPtr&, const ObjectPtr& addIn) {
           const std::string caption = separator ? std::string(kSeparator) : menuText(row.caption);
           Variant entry = CallMethod(addIn, hostid::kAddContextMenuItem,
                                      {Variant(row.itemType), Variant(caption), Variant(row.internalName)});
-          if (row.key && !MenuItems_.emplace(row.key, MenuEntry{entry.toObject()}).second)
+          if (row.key && !MenuItems_.emplace(row.key, entry.toObject()).second)
             throw AutomationError(vberr::kDuplicateKey);
         }
         return true;
@@ -120,12 +121,10 @@ bool API::BuildContextMenus(const ObjectPtr&, const ObjectPtr& addIn) {
 void API::SetMenuState(const char* key, bool enabled) {
   auto it = MenuItems_.find(key);
   if (it == MenuItems_.end()) throw AutomationError(vberr::kInvalidCall);
-  MenuEntry& entry = it->second;
-  if (!entry.object) throw AutomationError(vberr::kObjectNotSet);
-  // Every entry is the same kind of host object, but each resolves its own
-  // "MenuState" once: a name lookup is a round trip to the host.
-  if (entry.menuState == 0) entry.menuState = entry.object->IdOfName(hostid::kMenuState);
-  PutProperty(entry.object, entry.menuState, Variant(enabled));
+  const ObjectPtr& entry = it->second;
+  if (!entry) throw AutomationError(vberr::kObjectNotSet);
+  if (!hostNameIds_.menuState) hostNameIds_.menuState = entry->IdOfName(hostid::kMenuState);
+  PutProperty(entry, *hostNameIds_.menuState, Variant(enabled));
 }
 
 bool API::CheckComponent(const ObjectPtr& component) {
@@ -236,8 +235,12 @@ void API::OnEnableContextMenuItems(ObjectPtr& QuarnApp, int16_t& itemType) {
     SetMenuState("CClass_AddProperty", true);
     SetMenuState("CClass_ImplementInterface", false);
   } else {
-    ObjectPtr kind = CallByName(item, hostid::kClassKind, CallKind::PropertyGet).toObject();
-    const std::string kindName = CallByName(kind, "Name", CallKind::PropertyGet).toString();
+    if (!item) throw AutomationError(vberr::kObjectNotSet);
+    if (!hostNameIds_.classKind) hostNameIds_.classKind = item->IdOfName(hostid::kClassKind);
+    ObjectPtr kind = GetObject(item, *hostNameIds_.classKind);
+    if (!kind) throw AutomationError(vberr::kObjectNotSet);
+    if (!hostNameIds_.kindName) hostNameIds_.kindName = kind->IdOfName("Name");
+    const std::string kindName = GetProperty(kind, *hostNameIds_.kindName).toString();
     bool special = false;
     for (const char* k : kNonAtlClassKinds) special = special || kindName == k;
     atl(!special, false, false, false);
