@@ -32,6 +32,9 @@ struct ExposedType {
     VARTYPE result;  // VT_VOID for a Sub, VT_VARIANT when any value goes
   };
   std::vector<Member> members;
+  // True when the object answers members the type information does not
+  // list (an object described only for its own operations).
+  bool anyMember = false;
 
   const Member* Find(DISPID id) const;
   // Reads iid, members and result types from a dispinterface's type info.

@@ -142,7 +142,7 @@ HRESULT ObjectDispatch::Invoke(DISPID id, REFIID iid, LCID, WORD flags, DISPPARA
   if (!IsEqualIID(iid, IID_NULL)) return DISP_E_UNKNOWNINTERFACE;
   if (!params || (params->cArgs && !params->rgvarg)) return E_INVALIDARG;
   const ExposedType::Member* member = type_ ? type_->Find(id) : nullptr;
-  if (type_ && !member) return DISP_E_MEMBERNOTFOUND;
+  if (type_ && !member && !type_->anyMember) return DISP_E_MEMBERNOTFOUND;
 
   const bool put = (flags & (DISPATCH_PROPERTYPUT | DISPATCH_PROPERTYPUTREF)) != 0;
   if (put) {
