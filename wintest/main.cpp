@@ -213,6 +213,29 @@ void CreationAndTypeInformation() {
   CHECK_HR(Call(api.get(), 70, Flags::Method).hr, DISP_E_MEMBERNOTFOUND);
   CHECK_HR(Call(api.get(), 0, Flags::Get).hr, DISP_E_MEMBERNOTFOUND);
 
+  // Arguments go by position only; the interface argument must be IID_NULL.
+  Var app = Var::Disp(nullptr);
+  VARIANT args[1] = {app.v};
+  DISPID named = 1;
+  DISPPARAMS withNames{args, &named, 1, 1};
+  VARIANT result;
+  VariantInit(&result);
+  CHECK_HR(api->Invoke(22, IID_NULL, LOCALE_USER_DEFAULT, DISPATCH_METHOD, &withNames, &result, nullptr, nullptr),
+           DISP_E_NONAMEDARGS);
+  DISPPARAMS none{nullptr, nullptr, 0, 0};
+  CHECK_HR(api->Invoke(18, IID_IDispatch, LOCALE_USER_DEFAULT, DISPATCH_PROPERTYGET, &none, &result, nullptr, nullptr),
+           DISP_E_UNKNOWNINTERFACE);
+  LPOLESTR names[] = {const_cast<LPOLESTR>(L"OnActivate"), const_cast<LPOLESTR>(L"QuarnApp")};
+  DISPID ids[2] = {0, 0};
+  CHECK_HR(api->GetIDsOfNames(IID_NULL, names, 2, LOCALE_USER_DEFAULT, ids), DISP_E_UNKNOWNNAME);
+  CHECK_EQ(ids[0], 20L);
+  CHECK_EQ(ids[1], static_cast<long>(DISPID_UNKNOWN));
+  // A left-out optional argument is a missing argument, not a value.
+  Host host;
+  Var hostApp = Var::Disp(host.app.get()), missing = Var::Missing();
+  Outcome leftOut = Call(api.get(), 22, Flags::Method, {&hostApp, &missing});
+  CHECK_HR(leftOut.hr, S_OK);  // OnAppInit(QuarnApp) and a trailing left-out argument
+
   Ref<IUnknown> typed;
   CHECK_HR(api->QueryInterface(DIID__API, reinterpret_cast<void**>(typed.out())), S_OK);
   if (typed) CHECK(Identity(typed.get()) == Identity(api.get()));
