@@ -158,7 +158,8 @@ Variant ResourceObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> 
 std::string ResourceObject::Text(int32_t id) const {
   if (auto it = overrides_.find(id); it != overrides_.end()) return it->second;
   if (const char* text = FindResourceText(id)) return text;
-  throw AutomationError(vberr::kInvalidCall, "no string " + std::to_string(id));
+  // As the resource component answers an id it has no text for.
+  throw AutomationError(326, "Resource with identifier '" + std::to_string(id) + "' not found");
 }
 
 // ---------------------------------------------------------- SimObjectFactory

@@ -131,8 +131,8 @@ TEST_F(SimCompanionTest, ResourceTextsComeFromTheModelFirstAndAreNotRecorded) {
   Variant idArg(5001);
   EXPECT_EQ(Variant(FindResourceText(5001)), CallByName(byName, "GetString", CallKind::Method, {Variant::Ref(&idArg)}));
   const AutomationError missing = ErrorOf([&] { CallOwnOperation(byId, 1, CallKind::Method, {Variant(4)}); });
-  EXPECT_EQ(5, missing.number());
-  EXPECT_EQ("no string 4", missing.description());
+  EXPECT_EQ(326, missing.number());
+  EXPECT_EQ("Resource with identifier '4' not found", missing.description());
   EXPECT_TRUE(w.Events("companion-call").empty());
   const std::vector<EventJson> created = w.Events("object-create");
   ASSERT_EQ(2u, created.size());
