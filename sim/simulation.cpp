@@ -4,7 +4,7 @@
 
 namespace kpx::sim {
 
-Simulation::Simulation(const ModelDef& model, Environment environment)
+Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn)
     : model_(model),
       env_(environment),
       world_(model, log_),
@@ -16,7 +16,10 @@ Simulation::Simulation(const ModelDef& model, Environment environment)
       recordingClock_(clock_, log_),
       objects_(factory_, log_),
       platform_{registry_, files_, recordingClock_, objects_, ui_},
-      module_(platform_) {}
+      module_(platform_),
+      makeAddIn_(std::move(makeAddIn)) {
+  if (!makeAddIn_) makeAddIn_ = [this]() -> ObjectPtr { return CreateApi(module_); };
+}
 
 Simulation::~Simulation() {
   // The add-in object goes first: its destructor still talks to the world.
@@ -44,7 +47,7 @@ void Simulation::Run(const Scenario& scenario) {
 
 void Simulation::Create() {
   try {
-    api_ = CreateApi(module_);
+    api_ = makeAddIn_();
     log_.NameObject(api_.get(), "API");
     log_.Add({{"ev", "create"}, {"ok", true}});
   } catch (...) {

@@ -2,6 +2,7 @@
 // object made and called as a scenario says, and the event log of it all.
 #pragma once
 
+#include <functional>
 #include <memory>
 
 #include "addin/api.h"
@@ -24,10 +25,15 @@ struct Environment {
   FileSeeder& seeder;
 };
 
+// How the add-in object is made. The default makes it in this process on
+// the simulation's own module; a COM test host makes the real DLL's object
+// instead. Throws AutomationError when the object cannot be made.
+using AddInFactory = std::function<ObjectPtr()>;
+
 class Simulation {
  public:
   // `model` must outlive the simulation.
-  Simulation(const ModelDef& model, Environment environment);
+  Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn = {});
   ~Simulation();
   Simulation(const Simulation&) = delete;
   Simulation& operator=(const Simulation&) = delete;
@@ -43,7 +49,9 @@ class Simulation {
   EventLog& log() { return log_; }
   World& world() { return world_; }
   const platform::Platform& platform() const { return platform_; }
-  const std::shared_ptr<API>& api() const { return api_; }
+  // The add-in object while it lives; null when it is not one of this
+  // process's own (made by another factory).
+  std::shared_ptr<API> api() const { return std::dynamic_pointer_cast<API>(api_); }
 
   // The single steps of a scenario.
   void Create();
@@ -67,7 +75,8 @@ class Simulation {
   RecordingObjectFactory objects_;
   platform::Platform platform_;
   Module module_;
-  std::shared_ptr<API> api_;
+  AddInFactory makeAddIn_;
+  ObjectPtr api_;
   bool prepared_ = false;
 };
 

@@ -52,7 +52,7 @@
 #include "sim/model_file.h"
 #include "sim/scenario_file.h"
 #include "sim/sim_platform.h"
-#include "sim/world.h"
+#include "sim/simulation.h"
 
 namespace fs = std::filesystem;
 using namespace kpx;
@@ -240,10 +240,7 @@ class SimClass final : public IClassFactory {
 
 struct Host {
   const ModelDef& model;
-  EventLog log;
-  World world;
-  SimObjectFactory factory;
-  RecordingObjectFactory objects;
+  platform::ObjectFactory& objects;  // the simulation's, recording each creation
   win32::ServerLocks locks;
   std::map<const Object*, std::unique_ptr<win32::ExposedType>> types;
   std::map<const Object*, IID> requested;  // the interface a creation asked for
@@ -252,12 +249,8 @@ struct Host {
   std::vector<DWORD> cookies;
   std::vector<std::string> progIdKeys;  // ProgID keys this run wrote
 
-  explicit Host(const ModelDef& m)
-      : model(m),
-        world(m, log),
-        factory(world),
-        objects(factory, log),
-        bridge(locks, [this](const Object& o) { return Describe(o); }) {}
+  Host(const ModelDef& m, platform::ObjectFactory& o)
+      : model(m), objects(o), bridge(locks, [this](const Object& obj) { return Describe(obj); }) {}
 
   // Companions describe their own operations; host objects need nothing.
   const win32::ExposedType* Describe(const Object& o) {
@@ -342,7 +335,7 @@ HRESULT SimClass::CreateInstance(IUnknown* outer, REFIID iid, void** out) {
 
 // --------------------------------------------------------------- the run
 
-EventJson ErrorOfCreation(HRESULT hr) {
+AutomationError ErrorOfCreation(HRESULT hr) {
   std::string description;
   IErrorInfo* info = nullptr;
   if (GetErrorInfo(0, &info) == S_OK && info) {
@@ -352,111 +345,20 @@ EventJson ErrorOfCreation(HRESULT hr) {
     SysFreeString(text);
     info->Release();
   }
-  AutomationError e = description.empty() ? win32::ErrorFromHResult(hr)
-                                          : AutomationError(win32::VbNumberFromHResult(hr), description);
-  return ErrorJson(e);
+  return description.empty() ? win32::ErrorFromHResult(hr)
+                             : AutomationError(win32::VbNumberFromHResult(hr), description);
 }
 
-void CallMember(Host& host, const ObjectPtr& api, const Action& a) {
-  EventLog& log = host.log;
-  if (!api) {
-    log.Add({{"ev", "skip"}, {"member", a.member}, {"reason", "no add-in object"}});
-    return;
-  }
-  std::vector<Variant> slots(a.args.size());
-  std::vector<Variant> args;
-  std::vector<size_t> byRef;
-  EventJson shown = EventJson::array();
-  for (size_t i = 0; i < a.args.size(); ++i) {
-    const InputJson& arg = a.args[i];
-    if (arg.is_object() && arg.size() == 1 && arg.contains("byref")) {
-      slots[i] = host.world.ToVariant(arg.at("byref"));
-      args.push_back(Variant::Ref(&slots[i]));
-      byRef.push_back(i);
-      shown.push_back({{"byref", log.Value(slots[i])}});
-    } else {
-      args.push_back(host.world.ToVariant(arg));
-      shown.push_back(log.Value(args.back()));
-    }
-  }
-  EventJson call{{"ev", "call"}, {"member", a.member}, {"args", std::move(shown)}};
-  if (a.raw.contains("kind")) call["kind"] = a.kind == CallKind::PropertyGet ? "get" : "method";
-  log.Add(std::move(call));
-  const uint64_t before = log.hostCalls();
-  try {
-    const Variant result = api->Invoke(api->IdOfName(a.member), a.kind, args);
-    EventJson ev{{"ev", "result"}, {"member", a.member}, {"value", log.Value(result)},
-                 {"hostCalls", log.hostCalls() - before}};
-    if (!byRef.empty()) {
-      EventJson written = EventJson::object();
-      for (size_t i : byRef) written[std::to_string(i + 1)] = log.Value(slots[i]);
-      ev["byref"] = std::move(written);
-    }
-    log.Add(std::move(ev));
-  } catch (...) {
-    const AutomationError e = CurrentError();
-    log.Add({{"ev", "error"}, {"member", a.member}, {"number", e.number()}, {"description", e.description()},
-             {"hostCalls", log.hostCalls() - before}});
-  }
-}
-
-// The run itself; returns the debug log file's text.
-std::string Play(Host& host, const Scenario& scenario, win32::Win32Registry& registry, FileSeeder& seeder) {
-  EventLog& log = host.log;
-  ObjectPtr api;
-  auto create = [&] {
-    CLSID clsid;
-    IDispatch* d = nullptr;
-    HRESULT hr = CLSIDFromProgID(L"kpxAddIn.API", &clsid);
-    if (SUCCEEDED(hr)) hr = CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, IID_IDispatch, reinterpret_cast<void**>(&d));
-    if (FAILED(hr)) {
-      log.Add({{"ev", "create"}, {"ok", false}, {"error", ErrorOfCreation(hr)}});
-      return;
-    }
-    api = host.bridge.Adopt(d);
-    d->Release();
-    log.NameObject(api.get(), "API");
-    log.Add({{"ev", "create"}, {"ok", true}});
-  };
-  auto release = [&](bool implicit) {
-    if (!api) {
-      log.Add({{"ev", "release"}, {"implicit", implicit}, {"skipped", "no add-in object"}});
-      return;
-    }
-    log.Add({{"ev", "release"}, {"implicit", implicit}});
-    const Object* gone = api.get();
-    api.reset();
-    log.ForgetObject(gone);
-  };
-  auto logWorld = [&](const Action& a, const char* key) {
-    EventJson ev{{"ev", "world"}};
-    ev[key] = EventJson::parse(a.raw.at(key).dump());
-    log.Add(std::move(ev));
-  };
-
-  if (scenario.implicitCreate) create();
-  for (const Action& a : scenario.actions) {
-    switch (a.type) {
-      case Action::Type::Call: CallMember(host, api, a); break;
-      case Action::Type::Create: create(); break;
-      case Action::Type::Release: release(false); break;
-      case Action::Type::Select: host.world.Select(a.select); logWorld(a, "select"); break;
-      case Action::Type::Answer: logWorld(a, "answer"); break;  // not reached: such runs are skipped
-      case Action::Type::Clock: logWorld(a, "clock"); break;    // the DLL keeps the real time
-      case Action::Type::SetRegistry: SeedRegistry(registry, a.registry); logWorld(a, "setRegistry"); break;
-      case Action::Type::SetFile:
-        for (const auto& [path, content] : a.files) {
-          if (content)
-            seeder.WriteFile(path, *content);
-          else
-            seeder.RemoveFile(path);
-        }
-        logWorld(a, "setFile");
-        break;
-    }
-  }
-  if (api) release(true);
-  return {};
+// The add-in as the Quarn host makes it: by its ProgID, through COM.
+ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
+  CLSID clsid;
+  IDispatch* d = nullptr;
+  HRESULT hr = CLSIDFromProgID(L"kpxAddIn.API", &clsid);
+  if (SUCCEEDED(hr)) hr = CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, IID_IDispatch, reinterpret_cast<void**>(&d));
+  if (FAILED(hr)) throw ErrorOfCreation(hr);
+  ObjectPtr api = bridge.Adopt(d);
+  d->Release();
+  return api;
 }
 
 // ------------------------------------------------------------ comparing
@@ -570,7 +472,10 @@ int Main(int argc, char** argv) {
   RemoveJournaled();
 
   win32::Win32Registry registry;
+  win32::Win32FileSystem files;
   FileSeeder seeder([](std::string_view path) { return fs::path(win32::Utf8ToWide(path)); });
+  // The model's registry now, ahead of the simulation (which puts it in
+  // place again): it says where the debug log goes.
   SeedRegistry(registry, model.registry);
 
   // Where the DLL writes its debug log, found as it finds it.
@@ -588,17 +493,18 @@ int Main(int argc, char** argv) {
   const std::vector<fs::path> added = NewPaths(touched);
   Journal(added);
 
-  for (const std::string& folder : model.folders) seeder.MakeFolder(folder);
-  for (const auto& [path, content] : model.files) seeder.WriteFile(path, content);
-
   std::string jsonl, debugText;
   {
-    Host host(model);
-    host.RegisterAll();
-    Play(host, scenario, registry, seeder);
+    // The host's bridge outlives the simulation: the add-in object the
+    // simulation holds came through it.
+    std::unique_ptr<Host> host;
+    Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); });
+    host = std::make_unique<Host>(model, sim.platform().objects);
+    host->RegisterAll();
+    sim.Run(scenario);
     CoFreeUnusedLibraries();
-    host.RevokeAll();
-    jsonl = host.log.Jsonl();
+    host->RevokeAll();
+    jsonl = sim.log().Jsonl();
   }
   if (!logPath.empty()) debugText = ReadAll(fs::path(win32::Utf8ToWide(logPath)));
 
