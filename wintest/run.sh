@@ -3,7 +3,8 @@
 # in a private Wine prefix and runs the test host, which drives the add-in
 # through COM as the Quarn host does; then plays every scenario that has a
 # golden log through kpx-comsim (the simulated host as a COM host) and holds
-# its log against the native one. The x86 build is run too where a 32-bit
+# its log against the native one, answering the add-in's message boxes on
+# a screen of its own (Xvfb). The x86 build is run too where a 32-bit
 # Wine is installed; Debian's wine32 could not be installed on these
 # machines, so there it is built and reported as not run.
 #
@@ -14,6 +15,14 @@ BUILD=${BUILD:-build}
 started=$(date +%s)
 
 scripts/setup.sh native windows wine
+
+# One screen of its own for every Windows process of the run: the add-in's
+# message boxes are shown there (kpx-comsim answers them), and Wine's
+# desktop, which the first process starts, must have it from the beginning.
+if [ -z "${KPX_WINTEST_SCREEN:-}" ] && command -v xvfb-run >/dev/null; then
+  export KPX_WINTEST_SCREEN=1
+  exec xvfb-run -a "$PWD/wintest/run.sh" "$@"
+fi
 
 WINE64=$(command -v wine64 || echo /usr/lib/wine/wine64)
 WINESERVER=$(command -v wineserver || echo /usr/lib/wine/wineserver)

@@ -7,17 +7,25 @@
 // registry goes into the Wine registry and its files into the prefix's
 // drive C.
 //
+// The add-in's message boxes are real ones: a watcher (ScriptedUser)
+// presses on each the button the scenario queued, OK when none is left, as
+// the native run's scripted user answers; the help viewer the add-in starts
+// is ended after the run. Such scenarios need a display (run.sh gives them
+// one with xvfb-run); without one they are reported as skipped.
+//
 // Its event log is then held against the native run's golden log, leaving
 // out what only the native run can see or what depends on the real machine:
 //  - the add-in's own calls to its platform (registry-*, file-*, sleep,
-//    doevents, messagebox, help): in the DLL they go straight to Win32,
-//    past any host object, so no COM host can record them;
+//    doevents, help): in the DLL they go straight to Win32, past any host
+//    object, so no COM host can record them. WinHelpA hands its arguments
+//    to the help viewer, another process; a message box, though, is seen
+//    on the screen: its text, title, buttons and answer are compared;
+//  - the kind of a companion's call when it is a get or a method: a call
+//    through IDispatch asks for both at once;
 //  - the debug log events: compared instead with the real log file the DLL
 //    wrote, line by line, without the time stamps (a real clock, not the
 //    model's) and without the "Init time=" line (it says how long the real
 //    activation took).
-// Scenarios that answer message boxes cannot run here: a real message box
-// waits for a real user. They are reported as skipped.
 //
 // Usage: kpx-comsim <scenario.json> <golden.jsonl> <out.jsonl>
 // Exit: 0 same, 1 different, 2 bad input or failure, 3 skipped.
@@ -40,6 +48,7 @@
 
 #include "automation/error_styles.h"
 #include "own_operations.h"
+#include "scripted_user.h"
 #include "platform/win32/com_bridge.h"
 #include "platform/win32/com_errors.h"
 #include "platform/win32/object_dispatch.h"
@@ -238,6 +247,19 @@ class SimClass final : public IClassFactory {
   bool resource_;
 };
 
+// Whether `progIdKey` (HKCR\\<ProgID>\\CLSID) names a class some server
+// is registered for; a ProgID key a stopped run left names none.
+bool Registered(const std::string& progIdKey) {
+  char clsid[64] = {};
+  LONG size = sizeof(clsid);
+  if (RegQueryValueA(HKEY_CLASSES_ROOT, progIdKey.c_str(), clsid, &size) != ERROR_SUCCESS) return false;
+  HKEY server = nullptr;
+  const std::string key = std::string("CLSID\\") + clsid + "\\InprocServer32";
+  if (RegOpenKeyExA(HKEY_CLASSES_ROOT, key.c_str(), 0, KEY_READ, &server) != ERROR_SUCCESS) return false;
+  RegCloseKey(server);
+  return true;
+}
+
 struct Host {
   const ModelDef& model;
   platform::ObjectFactory& objects;  // the simulation's, recording each creation
@@ -276,10 +298,10 @@ struct Host {
     }
     if (!progId.empty()) {
       const std::string key = progId + "\\CLSID";
-      HKEY existing = nullptr;
-      if (RegOpenKeyExA(HKEY_CLASSES_ROOT, key.c_str(), 0, KEY_READ, &existing) == ERROR_SUCCESS) {
-        RegCloseKey(existing);  // a real registration (kpxres): its class id is ours too
+      if (Registered(key)) {
+        // A real registration (kpxres): its class id is ours too.
       } else {
+        // Not there, or left by a run that was stopped before it cleaned up.
         const std::wstring value = win32::GuidToWide(clsid);
         RegSetKeyValueW(HKEY_CLASSES_ROOT, win32::Utf8ToWide(key).c_str(), nullptr, REG_SZ, value.c_str(),
                         static_cast<DWORD>((value.size() + 1) * sizeof(wchar_t)));
@@ -335,7 +357,9 @@ HRESULT SimClass::CreateInstance(IUnknown* outer, REFIID iid, void** out) {
 
 // --------------------------------------------------------------- the run
 
-AutomationError ErrorOfCreation(HRESULT hr) {
+// The description a failed call left in the thread's IErrorInfo (taken
+// from it), or "".
+std::string PendingErrorDescription() {
   std::string description;
   IErrorInfo* info = nullptr;
   if (GetErrorInfo(0, &info) == S_OK && info) {
@@ -345,9 +369,38 @@ AutomationError ErrorOfCreation(HRESULT hr) {
     SysFreeString(text);
     info->Release();
   }
+  return description;
+}
+
+AutomationError ErrorOfCreation(HRESULT hr) {
+  const std::string description = PendingErrorDescription();
   return description.empty() ? win32::ErrorFromHResult(hr)
                              : AutomationError(win32::VbNumberFromHResult(hr), description);
 }
+
+// The add-in's object as the Quarn host calls it: a failure the DLL
+// answers with a bare HRESULT (E_NOTIMPL) and describes through IErrorInfo
+// is read with that description, as the host reads it.
+class HostView final : public Object {
+ public:
+  explicit HostView(ObjectPtr inner) : inner_(std::move(inner)) {}
+  DispId IdOfName(std::string_view name) override { return inner_->IdOfName(name); }
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override {
+    SetErrorInfo(0, nullptr);  // nothing left over from an earlier failure
+    try {
+      return inner_->Invoke(id, kind, args);
+    } catch (const AutomationError& e) {
+      // Only an error made from the HRESULT alone has its text elsewhere.
+      if (e.description() != win32::ErrorFromHResult(win32::HResultFromVbNumber(e.number())).description()) throw;
+      const std::string description = PendingErrorDescription();
+      if (description.empty()) throw;
+      throw AutomationError(e.number(), description);
+    }
+  }
+
+ private:
+  ObjectPtr inner_;
+};
 
 // The add-in as the Quarn host makes it: by its ProgID, through COM.
 ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
@@ -358,7 +411,7 @@ ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
   if (FAILED(hr)) throw ErrorOfCreation(hr);
   ObjectPtr api = bridge.Adopt(d);
   d->Release();
-  return api;
+  return std::make_shared<HostView>(std::move(api));
 }
 
 // ------------------------------------------------------------ comparing
@@ -366,8 +419,23 @@ ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
 bool PlatformEvent(const std::string& ev) {
   static const std::set<std::string> kinds = {"registry-read", "registry-write", "registry-create", "file-exists",
                                               "file-delete",   "file-append",    "sleep",           "doevents",
-                                              "messagebox",    "help",           "debuglog"};
+                                              "help",          "debuglog"};
   return kinds.count(ev) != 0;
+}
+
+// An event as both runs can see it. A late-bound call through IDispatch
+// asks for a method and a property get at once (as the Quarn host's own
+// calls do), so a companion cannot tell the two apart: its calls' "get" and
+// "method" kinds are one here. A message box is held by what the user sees
+// of it: its text, title, buttons and the button pressed (the icon and
+// default button bits of its style do not show on the box's buttons).
+std::string AsBothSeeIt(const std::string& line) {
+  EventJson ev = EventJson::parse(line);
+  const std::string kind = ev.at("ev");
+  if (kind == "companion-call" && ev.contains("kind") && (ev["kind"] == "get" || ev["kind"] == "method"))
+    ev.erase("kind");
+  if (kind == "messagebox") ev["style"] = ev.at("style").get<uint32_t>() & 0xFu;
+  return ev.dump();
 }
 
 // A debug line from its level on: the stamp before it is the clock's.
@@ -413,11 +481,11 @@ int Compare(const std::string& golden, const std::string& ours, const std::strin
                !served.count(Lower(ev.value("progid", ev.value("clsid", ""))))) {
       continue;
     } else if (!PlatformEvent(kind)) {
-      want.push_back(l);
+      want.push_back(AsBothSeeIt(l));
     }
   }
   for (const std::string& l : Lines(ours))
-    if (!PlatformEvent(EventJson::parse(l).at("ev"))) got.push_back(l);
+    if (!PlatformEvent(EventJson::parse(l).at("ev"))) got.push_back(AsBothSeeIt(l));
   for (const std::string& l : Lines(debugText))
     if (Comparable(l)) gotDebug.push_back(WithoutStamp(l));
 
@@ -457,13 +525,13 @@ int Main(int argc, char** argv) {
   const JsonSource modelSource = JsonSource::Load(modelFile->string());
   const ModelDef model = LoadModel(modelSource);
   const Scenario scenario = LoadScenario(scenarioSource, model);
-  // A real message box or help window waits for a real user.
   const std::string golden = ReadAll(argv[2]);
+  // A real message box needs a screen to be shown on.
   bool userInterface = golden.find("\"ev\":\"messagebox\"") != std::string::npos ||
                        golden.find("\"ev\":\"help\"") != std::string::npos;
   for (const Action& a : scenario.actions) userInterface = userInterface || a.type == Action::Type::Answer;
-  if (userInterface) {
-    std::printf("  skipped: the add-in shows a message box or help, which waits for a real user\n");
+  if (userInterface && GetEnvironmentVariableW(L"DISPLAY", nullptr, 0) == 0) {
+    std::printf("  skipped: the add-in shows a message box or help, and there is no display (DISPLAY)\n");
     return 3;
   }
 
@@ -501,7 +569,11 @@ int Main(int argc, char** argv) {
     Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); });
     host = std::make_unique<Host>(model, sim.platform().objects);
     host->RegisterAll();
-    sim.Run(scenario);
+    {
+      wintest::ScriptedUser user(sim.platform().ui);
+      sim.Run(scenario);
+    }
+    if (int ended = wintest::ScriptedUser::EndChildren()) std::printf("  ended %d process(es) the add-in left running\n", ended);
     CoFreeUnusedLibraries();
     host->RevokeAll();
     jsonl = sim.log().Jsonl();

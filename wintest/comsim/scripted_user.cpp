@@ -1,0 +1,166 @@
+#include "scripted_user.h"
+
+#include <tlhelp32.h>
+
+#include <iterator>
+#include <string>
+#include <vector>
+
+#include "platform/win32/win32_strings.h"
+
+namespace wintest {
+
+namespace {
+
+constexpr UINT kBoxFound = WM_APP + 1;
+constexpr wchar_t kClassName[] = L"kpxComsimScriptedUser";
+
+std::wstring ClassOf(HWND window) {
+  wchar_t name[64] = {};
+  GetClassNameW(window, name, 64);
+  return name;
+}
+
+std::string TextOf(HWND window) {
+  const int n = GetWindowTextLengthW(window);
+  std::wstring text(static_cast<size_t>(n) + 1, L'\0');
+  text.resize(static_cast<size_t>(GetWindowTextW(window, text.data(), n + 1)));
+  return kpx::win32::WideToUtf8(text);
+}
+
+BOOL CALLBACK FirstText(HWND child, LPARAM out) {
+  if (_wcsicmp(ClassOf(child).c_str(), L"Static") != 0 || GetWindowTextLengthW(child) == 0) return TRUE;
+  *reinterpret_cast<std::string*>(out) = TextOf(child);
+  return FALSE;
+}
+
+// The message: the box's one static control with text (the icon has none).
+std::string MessageOf(HWND box) {
+  std::string found;
+  EnumChildWindows(box, FirstText, reinterpret_cast<LPARAM>(&found));
+  return found;
+}
+
+bool Shown(HWND box, int id) {
+  HWND button = GetDlgItem(box, id);
+  return button && IsWindowVisible(button);
+}
+
+// The MB_ button set a box shows (the style's lowest four bits).
+uint32_t ButtonsOf(HWND box) {
+  if (Shown(box, IDABORT)) return MB_ABORTRETRYIGNORE;
+  if (Shown(box, IDYES)) return Shown(box, IDCANCEL) ? MB_YESNOCANCEL : MB_YESNO;
+  if (Shown(box, IDRETRY)) return MB_RETRYCANCEL;
+  if (Shown(box, IDCANCEL)) return MB_OKCANCEL;
+  return MB_OK;
+}
+
+struct Boxes {
+  std::vector<HWND> own;     // the add-in's: dialogs of this process, shown
+  std::vector<HWND> others;  // dialogs of other processes, shown
+};
+
+BOOL CALLBACK FindBoxes(HWND window, LPARAM out) {
+  if (!IsWindowVisible(window) || ClassOf(window) != L"#32770") return TRUE;
+  DWORD process = 0;
+  GetWindowThreadProcessId(window, &process);
+  auto* boxes = reinterpret_cast<Boxes*>(out);
+  (process == GetCurrentProcessId() ? boxes->own : boxes->others).push_back(window);
+  return TRUE;
+}
+
+// The processes this process started.
+std::set<DWORD> Children() {
+  std::set<DWORD> children;
+  HANDLE snapshot = CreateToolhelp32Snapshot(TH32CS_SNAPPROCESS, 0);
+  if (snapshot == INVALID_HANDLE_VALUE) return children;
+  PROCESSENTRY32W entry = {};
+  entry.dwSize = sizeof(entry);
+  for (BOOL more = Process32FirstW(snapshot, &entry); more; more = Process32NextW(snapshot, &entry))
+    if (entry.th32ParentProcessID == GetCurrentProcessId() && entry.th32ProcessID != GetCurrentProcessId())
+      children.insert(entry.th32ProcessID);
+  CloseHandle(snapshot);
+  return children;
+}
+
+}  // namespace
+
+ScriptedUser::ScriptedUser(kpx::platform::UserInterface& answers) : answers_(answers) {
+  WNDCLASSW wc = {};
+  wc.lpfnWndProc = WindowProc;
+  wc.hInstance = GetModuleHandleW(nullptr);
+  wc.lpszClassName = kClassName;
+  RegisterClassW(&wc);
+  window_ = CreateWindowExW(0, kClassName, L"", 0, 0, 0, 0, 0, HWND_MESSAGE, nullptr, wc.hInstance, nullptr);
+  SetWindowLongPtrW(window_, GWLP_USERDATA, reinterpret_cast<LONG_PTR>(this));
+  stop_ = CreateEventW(nullptr, TRUE, FALSE, nullptr);
+  thread_ = CreateThread(nullptr, 0, Watch, this, 0, nullptr);
+}
+
+ScriptedUser::~ScriptedUser() {
+  SetEvent(stop_);
+  WaitForSingleObject(thread_, INFINITE);
+  CloseHandle(thread_);
+  CloseHandle(stop_);
+  DestroyWindow(window_);
+  UnregisterClassW(kClassName, GetModuleHandleW(nullptr));
+}
+
+// The watcher only looks at the add-in's boxes: each one it sees goes to
+// the add-in's thread, whose modal loop (the box's own) hands it to
+// WindowProc. A box of a process the add-in started (the help viewer saying
+// it cannot read a help file) holds the add-in too, waiting for that
+// process: the watcher presses its OK itself, as a user would.
+DWORD WINAPI ScriptedUser::Watch(void* self) {
+  auto* user = static_cast<ScriptedUser*>(self);
+  std::set<HWND> pressed;
+  while (WaitForSingleObject(user->stop_, 20) == WAIT_TIMEOUT) {
+    Boxes boxes;
+    EnumWindows(FindBoxes, reinterpret_cast<LPARAM>(&boxes));
+    for (HWND box : boxes.own) PostMessageW(user->window_, kBoxFound, 0, reinterpret_cast<LPARAM>(box));
+    for (auto it = pressed.begin(); it != pressed.end();) it = IsWindow(*it) ? std::next(it) : pressed.erase(it);
+    if (boxes.others.empty()) continue;
+    const std::set<DWORD> children = Children();
+    for (HWND box : boxes.others) {
+      DWORD process = 0;
+      GetWindowThreadProcessId(box, &process);
+      if (!children.count(process) || !pressed.insert(box).second) continue;
+      PostMessageW(box, WM_COMMAND, MAKEWPARAM(IDOK, BN_CLICKED), reinterpret_cast<LPARAM>(GetDlgItem(box, IDOK)));
+    }
+  }
+  return 0;
+}
+
+LRESULT CALLBACK ScriptedUser::WindowProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam) {
+  if (message == kBoxFound) {
+    auto* user = reinterpret_cast<ScriptedUser*>(GetWindowLongPtrW(window, GWLP_USERDATA));
+    if (user) user->Answer(reinterpret_cast<HWND>(lParam));
+    return 0;
+  }
+  return DefWindowProcW(window, message, wParam, lParam);
+}
+
+void ScriptedUser::Answer(HWND box) {
+  for (auto it = answered_.begin(); it != answered_.end();) it = IsWindow(*it) ? std::next(it) : answered_.erase(it);
+  if (!IsWindow(box) || !IsWindowVisible(box) || answered_.count(box)) return;
+  answered_.insert(box);
+  const int button = answers_.MessageBox(MessageOf(box), TextOf(box), ButtonsOf(box));
+  // What a click on the button sends; the box ends with that id.
+  PostMessageW(box, WM_COMMAND, MAKEWPARAM(button, BN_CLICKED), reinterpret_cast<LPARAM>(GetDlgItem(box, button)));
+}
+
+int ScriptedUser::EndChildren() {
+  int ended = 0;
+  for (DWORD id : Children()) {
+    HANDLE process = OpenProcess(PROCESS_TERMINATE | SYNCHRONIZE, FALSE, id);
+    if (!process) continue;
+    if (TerminateProcess(process, 0)) {
+      WaitForSingleObject(process, 5000);
+      ++ended;
+    }
+    CloseHandle(process);
+  }
+  return ended;
+}
+
+}  // namespace wintest

@@ -1,0 +1,41 @@
+// The user at the test host's screen, as the native run scripts it: the
+// add-in's real message boxes are answered with the buttons the scenario
+// queued (OK when none is left), and whatever the add-in started on the way
+// (the help viewer) is ended after the run.
+#pragma once
+
+#include "platform/win32/win32_api.h"
+
+#include <set>
+
+#include "platform/platform.h"
+
+namespace wintest {
+
+class ScriptedUser {
+ public:
+  // `answers` picks the button of each box (and logs the box); it is only
+  // ever called on the thread that made this object, inside the add-in's
+  // own message loop.
+  explicit ScriptedUser(kpx::platform::UserInterface& answers);
+  ~ScriptedUser();
+  ScriptedUser(const ScriptedUser&) = delete;
+  ScriptedUser& operator=(const ScriptedUser&) = delete;
+
+  // Ends the processes this process started that still run; returns how
+  // many.
+  static int EndChildren();
+
+ private:
+  static LRESULT CALLBACK WindowProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam);
+  static DWORD WINAPI Watch(void* self);
+  void Answer(HWND box);
+
+  kpx::platform::UserInterface& answers_;
+  HWND window_ = nullptr;   // message-only, on the add-in's thread
+  HANDLE thread_ = nullptr;
+  HANDLE stop_ = nullptr;
+  std::set<HWND> answered_;  // boxes pressed and not gone yet (add-in's thread)
+};
+
+}  // namespace wintest
