@@ -152,7 +152,7 @@ Variant DispatchObject::Invoke(DispId id, CallKind kind, std::span<Variant> args
   if (FAILED(hr)) {
     VariantClear(&result);
     if (hr == DISP_E_EXCEPTION) throw ErrorFromExcepInfo(info);
-    throw ErrorFromHResult(hr);
+    throw ErrorFromHResult(hr, dispatch_, IID_IDispatch);  // the callee may have left its text
   }
   Variant out;
   try {
