@@ -20,6 +20,16 @@ namespace kpx::test {
 
 using Journal = std::vector<std::string>;
 
+// The VB error number `f` raises, 0 when it raises none.
+inline int32_t ErrorNumberOf(const std::function<void()>& f) {
+  try {
+    f();
+  } catch (const AutomationError& e) {
+    return e.number();
+  }
+  return 0;
+}
+
 // An automation object whose members are lambdas, journaling every call as
 // "label.member".
 class FakeObject : public Object {

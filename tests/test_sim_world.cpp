@@ -5,6 +5,7 @@
 
 #include "shared/host_ids.h"
 #include "sim/host_objects.h"
+#include "fakes.h"
 #include "test_sim_support.h"
 
 namespace kpx::sim::test {
@@ -12,14 +13,7 @@ namespace {
 
 namespace id = kpx::hostid;
 
-int32_t ErrorOf(const std::function<void()>& f) {
-  try {
-    f();
-  } catch (const AutomationError& e) {
-    return e.number();
-  }
-  return 0;
-}
+using kpx::test::ErrorNumberOf;
 
 const char* kWorld = R"({
   "application": {"path": "C:\\Quarn", "mainWindow": 77, "window": {"top": 1, "left": 2, "height": 3, "width": 4},
@@ -80,12 +74,12 @@ TEST_F(SimWorldTest, CollectionsAreOneBasedAndGuardTheirEnds) {
   EXPECT_EQ(2, count.toInt16());
   EXPECT_EQ("addin:VC++", LabelOf(CallMethod(addins, id::kGetAt, {Variant(int16_t{1})})));
   EXPECT_EQ("addin:Plain", LabelOf(CallMethod(addins, id::kGetAt, {Variant(int16_t{2})})));
-  EXPECT_EQ(vberr::kSubscript, ErrorOf([&] { CallMethod(addins, id::kGetAt, {Variant(int16_t{0})}); }));
-  EXPECT_EQ(vberr::kSubscript, ErrorOf([&] { CallMethod(addins, id::kGetAt, {Variant(int16_t{3})}); }));
-  EXPECT_EQ(vberr::kOverflow, ErrorOf([&] { CallMethod(addins, id::kGetAt, {Variant(40000)}); }));
-  EXPECT_EQ(vberr::kWrongArgCount, ErrorOf([&] { CallMethod(addins, id::kGetAt); }));
+  EXPECT_EQ(vberr::kSubscript, ErrorNumberOf([&] { CallMethod(addins, id::kGetAt, {Variant(int16_t{0})}); }));
+  EXPECT_EQ(vberr::kSubscript, ErrorNumberOf([&] { CallMethod(addins, id::kGetAt, {Variant(int16_t{3})}); }));
+  EXPECT_EQ(vberr::kOverflow, ErrorNumberOf([&] { CallMethod(addins, id::kGetAt, {Variant(40000)}); }));
+  EXPECT_EQ(vberr::kWrongArgCount, ErrorNumberOf([&] { CallMethod(addins, id::kGetAt); }));
   // The host's add-in list cannot be changed; model collections can.
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] { addins->IdOfName("RemoveAll"); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { addins->IdOfName("RemoveAll"); }));
   ObjectPtr selection = CallMethod(GetObject(app(), id::kCurrentModel), id::kGetSelectedItems).toObject();
   EXPECT_EQ("element:Circle", LabelOf(CallMethod(selection, id::kGetAt, {Variant(int16_t{1})})));
   CallByName(selection, "RemoveAll", CallKind::Method);
@@ -135,10 +129,10 @@ TEST_F(SimWorldTest, MenuEntriesStartAsTheModelSaysAndRecordTheExactValueWritten
   EXPECT_EQ(7, states[2]["itemType"]);
   EXPECT_EQ(3u, w.Events("menu-add").size());
   // A host without context menus has no such member, by id or by name.
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] {
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] {
               CallMethod(addin("Plain"), id::kAddContextMenuItem, {Variant(int16_t{4}), "a", "b"});
             }));
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] { addin("Plain")->IdOfName("AddContextMenuItem"); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { addin("Plain")->IdOfName("AddContextMenuItem"); }));
 }
 
 TEST_F(SimWorldTest, ApplicationAnswersAndRecordsItsEffects) {
@@ -149,7 +143,7 @@ TEST_F(SimWorldTest, ApplicationAnswersAndRecordsItsEffects) {
   EXPECT_EQ(Variant(int16_t{640}), GetProperty(app(), id::kWindowWidth));
   CallMethod(app(), id::kWriteErrorLog, {"hello"});
   CallMethod(app(), id::kExecuteScript, {"C:\\good.ebs"});
-  EXPECT_EQ(1004, ErrorOf([&] { CallMethod(app(), id::kExecuteScript, {"c:\\BAD.ebs"}); }));
+  EXPECT_EQ(1004, ErrorNumberOf([&] { CallMethod(app(), id::kExecuteScript, {"c:\\BAD.ebs"}); }));
   EXPECT_EQ("hello", w.Events("hostlog").at(0)["text"]);
   const std::vector<EventJson> scripts = w.Events("script");
   ASSERT_EQ(2u, scripts.size());
@@ -157,8 +151,8 @@ TEST_F(SimWorldTest, ApplicationAnswersAndRecordsItsEffects) {
   EXPECT_EQ(1004, scripts[1]["error"]["number"]);
   EXPECT_EQ("Width", w.Events("element-write").at(0)["member"]);
   // Reads cannot be written, and methods want their arguments.
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] { PutProperty(app(), id::kApplicationPath, Variant("x")); }));
-  EXPECT_EQ(vberr::kWrongArgCount, ErrorOf([&] { CallMethod(app(), id::kWriteErrorLog); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { PutProperty(app(), id::kApplicationPath, Variant("x")); }));
+  EXPECT_EQ(vberr::kWrongArgCount, ErrorNumberOf([&] { CallMethod(app(), id::kWriteErrorLog); }));
 }
 
 TEST_F(SimWorldTest, OneDispIdMeansWhatTheObjectsKindMakesIt) {
@@ -170,8 +164,8 @@ TEST_F(SimWorldTest, OneDispIdMeansWhatTheObjectsKindMakesIt) {
   // 434 belongs to attributes, 444 to operations; a class knows neither.
   EXPECT_EQ("element:Circle", LabelOf(GetProperty(element("Circle.Draw"), id::kOperationParentClass)));
   EXPECT_EQ("element:Circle", LabelOf(CallByName(element("Circle.Draw"), "ParentClass", CallKind::PropertyGet)));
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] { GetProperty(element("Circle.Draw"), id::kAttributeParentClass); }));
-  EXPECT_EQ(vberr::kNoSuchMember, ErrorOf([&] { CallMethod(element("Shapes"), id::kGetInheritRelations); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { GetProperty(element("Circle.Draw"), id::kAttributeParentClass); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { CallMethod(element("Shapes"), id::kGetInheritRelations); }));
   EXPECT_EQ("VC++", GetProperty(element("Shapes"), id::kModuleLanguage).toString());
   EXPECT_EQ("Operation", CallMethod(element("Circle.Draw"), id::kIdentifyClass).toString());
   EXPECT_TRUE(CallMethod(element("Circle"), id::kIsKindOf, {"class"}).toBool());
@@ -215,9 +209,9 @@ TEST_F(SimWorldTest, DeletedInheritRelationsLeaveTheClass) {
   ASSERT_EQ(1, GetProperty(inherits, id::kCount).toInt16());
   EXPECT_EQ("element:i2", LabelOf(CallMethod(inherits, id::kGetAt, {Variant(int16_t{1})})));
   // Neither a relation deleted before nor one of another class can be deleted.
-  EXPECT_EQ(vberr::kInvalidCall, ErrorOf([&] { CallMethod(circle, id::kDeleteInheritRel, {Variant(element("i1"))}); }));
+  EXPECT_EQ(vberr::kInvalidCall, ErrorNumberOf([&] { CallMethod(circle, id::kDeleteInheritRel, {Variant(element("i1"))}); }));
   EXPECT_EQ(vberr::kInvalidCall,
-            ErrorOf([&] { CallMethod(element("IShape"), id::kDeleteInheritRel, {Variant(element("i2"))}); }));
+            ErrorNumberOf([&] { CallMethod(element("IShape"), id::kDeleteInheritRel, {Variant(element("i2"))}); }));
   const EventJson write = w.Events("element-write").at(0);
   EXPECT_EQ("Circle", write["element"]);
   EXPECT_EQ((EventJson{{"object", "element:i1"}}), write["value"]);
@@ -227,7 +221,7 @@ TEST_F(SimWorldTest, AssociationsLeadFromOneEndToTheOther) {
   ObjectPtr a = element("a");
   EXPECT_EQ("element:r2", LabelOf(CallMethod(a, id::kGetOtherRole, {Variant(element("Circle"))})));
   EXPECT_EQ("element:r1", LabelOf(CallMethod(a, id::kGetOtherRole, {Variant(element("CCircle"))})));
-  EXPECT_EQ(vberr::kInvalidCall, ErrorOf([&] { CallMethod(a, id::kGetOtherRole, {Variant(element("IShape"))}); }));
+  EXPECT_EQ(vberr::kInvalidCall, ErrorNumberOf([&] { CallMethod(a, id::kGetOtherRole, {Variant(element("IShape"))}); }));
   EXPECT_EQ("element:a", LabelOf(CallByName(element("r1"), "Association", CallKind::PropertyGet)));
   EXPECT_TRUE(GetProperty(element("r1"), id::kNavigable).toBool());
   EXPECT_FALSE(GetProperty(element("r2"), id::kNavigable).toBool());

@@ -10,31 +10,24 @@
 namespace kpx {
 namespace {
 
-int32_t ErrorOf(const std::function<void()>& f) {
-  try {
-    f();
-  } catch (const AutomationError& e) {
-    return e.number();
-  }
-  return 0;
-}
+using kpx::test::ErrorNumberOf;
 
 TEST(VariantConversion, NumbersRoundHalfToEvenAndOverflowLikeVb) {
   EXPECT_EQ(Variant(2.5).toInt32(), 2);
   EXPECT_EQ(Variant(3.5).toInt32(), 4);
   EXPECT_EQ(Variant(-2.5).toInt16(), -2);
-  EXPECT_EQ(ErrorOf([] { Variant(40000).toInt16(); }), vberr::kOverflow);
-  EXPECT_EQ(ErrorOf([] { Variant(3e9).toInt32(); }), vberr::kOverflow);
+  EXPECT_EQ(ErrorNumberOf([] { Variant(40000).toInt16(); }), vberr::kOverflow);
+  EXPECT_EQ(ErrorNumberOf([] { Variant(3e9).toInt32(); }), vberr::kOverflow);
   EXPECT_EQ(Variant(true).toInt32(), -1);
 }
 
 TEST(VariantConversion, TextConvertsOnlyWhenAllOfItIsANumber) {
   EXPECT_EQ(Variant(" 42 ").toInt32(), 42);
   EXPECT_EQ(Variant("&HFF000080").toInt32(), static_cast<int32_t>(0xFF000080u));
-  EXPECT_EQ(ErrorOf([] { Variant("12x").toInt32(); }), vberr::kTypeMismatch);
-  EXPECT_EQ(ErrorOf([] { Variant("").toInt32(); }), vberr::kTypeMismatch);
-  EXPECT_EQ(ErrorOf([] { Variant::Null().toString(); }), vberr::kInvalidUseOfNull);
-  EXPECT_EQ(ErrorOf([] { Variant(5).toObject(); }), vberr::kObjectRequired);
+  EXPECT_EQ(ErrorNumberOf([] { Variant("12x").toInt32(); }), vberr::kTypeMismatch);
+  EXPECT_EQ(ErrorNumberOf([] { Variant("").toInt32(); }), vberr::kTypeMismatch);
+  EXPECT_EQ(ErrorNumberOf([] { Variant::Null().toString(); }), vberr::kInvalidUseOfNull);
+  EXPECT_EQ(ErrorNumberOf([] { Variant(5).toObject(); }), vberr::kObjectRequired);
 }
 
 TEST(VariantConversion, EmptyReadsAsZeroBlankAndFalse) {
@@ -102,9 +95,9 @@ TEST(LateBinding, ByReferenceArgumentsComeBackAndNothingRaises91) {
   EXPECT_EQ(slot.toString(), "replaced");
   CallByName(obj, "SWAP", CallKind::Method, {Variant::Ref(&slot)});
 
-  EXPECT_EQ(ErrorOf([] { CallMethod(nullptr, 1); }), vberr::kObjectNotSet);
-  EXPECT_EQ(ErrorOf([&] { CallByName(obj, "Missing", CallKind::Method); }), vberr::kNoSuchMember);
-  EXPECT_EQ(ErrorOf([&] { CallOwnOperation(obj, 3, CallKind::Method); }), vberr::kNoSuchMember);
+  EXPECT_EQ(ErrorNumberOf([] { CallMethod(nullptr, 1); }), vberr::kObjectNotSet);
+  EXPECT_EQ(ErrorNumberOf([&] { CallByName(obj, "Missing", CallKind::Method); }), vberr::kNoSuchMember);
+  EXPECT_EQ(ErrorNumberOf([&] { CallOwnOperation(obj, 3, CallKind::Method); }), vberr::kNoSuchMember);
 }
 
 TEST(ErrorStyles, ResumeNextKeepsTheLastFailureAndCarriesOn) {

@@ -117,10 +117,8 @@ class API final : public Object {
   std::string GetLocation(const std::string& path, bool useDefault);
 
   const std::string& menuText(MenuText which) const { return menuTexts_[static_cast<size_t>(which)]; }
-  Module& module() { return module_; }
   // The menu entries the host returned, by key, as the last build left them.
   std::vector<std::string> menuItemKeys() const;
-  ObjectPtr menuItem(std::string_view key) const;
   // The user commands' automation object names, by slot ("OnUser1" ..).
   const std::map<std::string, std::string, NoCaseLess>& userCommands() const { return UserCommands_; }
 

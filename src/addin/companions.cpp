@@ -3,6 +3,7 @@
 #include <string>
 
 #include "addin/api.h"
+#include "addin/app_calls.h"
 #include "automation/error_styles.h"
 #include "shared/host_ids.h"
 
@@ -14,17 +15,6 @@ constexpr const char* kAtlTools = "kpxatltools.kpxatlGUI";
 // Texts of the message shown when the model assistant has no class to work on.
 constexpr int32_t kMsgNoClassSelected = 5055;
 constexpr int32_t kMsgNoClassSelectedTitle = 5056;
-
-// Calls `member` with the host application by reference (after `leading`
-// arguments) and takes back the application the callee may have replaced.
-void CallWithApp(const ObjectPtr& object, const char* member, ObjectPtr& QuarnApp,
-                 std::initializer_list<Variant> leading = {}) {
-  Variant app(QuarnApp);
-  std::vector<Variant> args(leading);
-  args.push_back(Variant::Ref(&app));
-  Invoke(object, object ? object->IdOfName(member) : 0, CallKind::Method, args);
-  QuarnApp = app.toObject();
-}
 
 }  // namespace
 
@@ -148,10 +138,10 @@ Variant API::OnLangProperties(ObjectPtr& QuarnApp, const Variant& lPage) {
   return CatchAll(
       [&] {
         module_.DebugLog("kpxAddin.OnModelUpdateOptions: Calling kpxLangProps.", logid::ADDIN, loglevel::TRACE);
-        ObjectPtr pages = LangPropertiesAPI();
-        Variant app(QuarnApp);
         Variant page(lPage.isEmpty() ? Variant(0) : lPage.deref());
-        Variant answer = CallByName(pages, "ShowProperties", CallKind::Method, {Variant::Ref(&app), page});
+        // The page number follows the application here, so the shared helper does not fit.
+        Variant app(QuarnApp);
+        Variant answer = CallByName(LangPropertiesAPI(), "ShowProperties", CallKind::Method, {Variant::Ref(&app), page});
         QuarnApp = app.toObject();
         return answer;
       },

@@ -91,10 +91,6 @@ std::vector<std::string> API::menuItemKeys() const {
   return keys;
 }
 
-ObjectPtr API::menuItem(std::string_view key) const {
-  auto it = MenuItems_.find(key);
-  return it == MenuItems_.end() ? nullptr : it->second;
-}
 
 // ------------------------------------------------------------------ catalogue
 

@@ -4,6 +4,7 @@
 #include <string>
 
 #include "addin/api.h"
+#include "addin/app_calls.h"
 #include "addin/find_addin.h"
 #include "automation/error_styles.h"
 #include "shared/host_ids.h"
@@ -12,13 +13,9 @@ namespace kpx {
 
 namespace {
 
-// Calls `event` on the add-in's "EventHandler" with the host application by
-// reference, and takes back the application the handler may have replaced.
+// Calls `event` on the add-in's "EventHandler" with the host application.
 void CallEventHandler(const ObjectPtr& addIn, const char* event, ObjectPtr& QuarnApp) {
-  ObjectPtr handler = CallByName(addIn, hostid::kEventHandler, CallKind::PropertyGet).toObject();
-  Variant app(QuarnApp);
-  CallByName(handler, event, CallKind::Method, {Variant::Ref(&app)});
-  QuarnApp = app.toObject();
+  CallWithApp(CallByName(addIn, hostid::kEventHandler, CallKind::PropertyGet).toObject(), event, QuarnApp);
 }
 
 int32_t Swallow(const AutomationError&) { return 0; }
