@@ -13,6 +13,7 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <utility>
 
 #include "api_h.h"
 #include "kpxres_h.h"
@@ -125,6 +126,75 @@ void RegistrationRoundTrip(const Paths& paths) {
     const std::set<std::wstring> after = SnapshotClassesRoot(keys);
     CHECK(after == before);
     for (const std::wstring& left : after) std::printf("  left behind: %s\n", Narrow(left).c_str());
+
+    CHECK_EQ(Regsvr32(dll, false), 0ul);  // registered again for what follows
+  }
+}
+
+// On 64-bit Windows a 32-bit and a 64-bit build of one library can be
+// registered side by side: each in its own view of CLSID and Interface, both
+// under one ProgID and one TypeLib key. The other build is written here as
+// its regsvr32 writes it, in the other view; this build's /u must leave it
+// working, and the last /u must still leave nothing.
+void SideBySideRegistration(const Paths& paths) {
+  Group("regsvr32 /u leaves the other build's ProgIDs and type library platform; the last /u leaves nothing");
+  if (!HasOtherBuildsView()) {
+    std::printf("  not run: 32-bit Windows has one registry view\n");
+    return;
+  }
+  const REGSAM other = OtherBuildsView();
+  const bool is64 = sizeof(void*) == 8;
+  const std::wstring ownPlatform = is64 ? L"win64" : L"win32";
+  const std::wstring otherPlatform = is64 ? L"win32" : L"win64";
+  for (int pass = 0; pass < 2; ++pass) {
+    const bool addin = pass == 0;
+    const std::wstring& dll = addin ? paths.addin : paths.res;
+    const std::vector<std::wstring> keys = addin ? AddInKeys() : ResourceKeys();
+    std::vector<std::pair<std::wstring, std::wstring>> classes;  // class id, ProgID
+    if (addin) {
+      classes = {{Guid(CLSID_API), L"kpxAddIn.API"}, {Guid(CLSID_TokenScanner), L"kpxAddIn.TokenScanner"}};
+    } else {
+      classes = {{Guid(CLSID_KPXResourceInterface), L"kpxres.KPXResourceInterface"}};
+    }
+    const std::wstring versionKey = L"TypeLib\\" + Guid(addin ? LIBID_kpxAddIn : LIBID_kpxres) + L"\\1.0";
+    const std::wstring otherDll = L"C:\\other build\\" + dll.substr(dll.find_last_of(L'\\') + 1);
+
+    bool otherAlready = false;
+    for (const auto& [clsid, progId] : classes) {
+      HKEY probe = nullptr;
+      if (RegOpenKeyExW(HKEY_CLASSES_ROOT, (L"CLSID\\" + clsid).c_str(), 0, KEY_READ | other, &probe) == ERROR_SUCCESS) {
+        RegCloseKey(probe);
+        otherAlready = true;
+      }
+    }
+    if (!CHECK(!otherAlready)) {
+      std::printf("  the other build is registered in this registry: unregister it before the test\n");
+      continue;
+    }
+    for (const auto& [clsid, progId] : classes)
+      CHECK(WriteDefault(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid + L"\\InprocServer32", other, otherDll));
+    CHECK(WriteDefault(HKEY_CLASSES_ROOT, versionKey + L"\\0\\" + otherPlatform, 0, otherDll));
+
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> left = SnapshotClassesRoot(keys);
+    for (const auto& [clsid, progId] : classes) {
+      CHECK(Contains(left, progId + L"\\CLSID|=1:" + clsid));
+      CHECK(!Contains(left, L"CLSID\\" + clsid));
+    }
+    CHECK(Contains(left, versionKey + L"\\0\\" + otherPlatform + L"|=1:" + otherDll));
+    CHECK(Contains(left, versionKey + L"\\FLAGS"));
+    CHECK(!Contains(left, versionKey + L"\\0\\" + ownPlatform));
+
+    // The other build gone too, this build's /u takes what was shared.
+    for (const auto& [clsid, progId] : classes) {
+      CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid + L"\\InprocServer32", other));
+      CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid, other));
+    }
+    CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, versionKey + L"\\0\\" + otherPlatform, 0));
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> after = SnapshotClassesRoot(keys);
+    CHECK(after.empty());
+    for (const std::wstring& line : after) std::printf("  left behind: %s\n", Narrow(line).c_str());
 
     CHECK_EQ(Regsvr32(dll, false), 0ul);  // registered again for what follows
   }
@@ -768,6 +838,7 @@ int main(int argc, char** argv) {
   std::printf("kpx-wintest: %s build\n", sizeof(void*) == 8 ? "x64" : "x86");
 
   RegistrationRoundTrip(paths);
+  SideBySideRegistration(paths);
 
   // Logging on for everything of the add-in, without time stamps, and the
   // "VisualStudio" add-in switched off; read once, when the add-in loads.
