@@ -145,7 +145,8 @@ TEST_F(ApiTest, ActivationRunsItsStepsInOrder) {
                            "VC++#1.ReadSetting Events OnUser3 ", "VC++#1.ReadSetting Events OnUser4 ",
                            "VC++#1.ReadSetting Events OnUser5 "}));
   EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n"
-                   " TRACE    ADDIN     kpxAddin.GetLocation(Path, UseDefault)\r\n");
+                   " TRACE    ADDIN     kpxAddin.GetLocation(Path, UseDefault)\r\n"
+                   " TRACE    ADDIN     kpxAddin.QuarnApp()\r\n");
   EXPECT_EQ(api->menuItemKeys().size(), 24u);
   EXPECT_EQ(api->userCommands().at("OnUser2"), "Tools.Count");
 }

@@ -218,7 +218,9 @@ TEST_F(CommandTest, ForwardingWithoutTheSiblingWritesOneErrorLineEach) {
   EXPECT_EQ(api->OnGenerateCode(a), 0);
   EXPECT_EQ(api->OnComponentAssignment(a), 0);
   EXPECT_EQ(api->OnModelUpdate(a), 0);
-  EXPECT_EQ(Log(), " ERROR    ADDIN     kpxAddin.OnGenerateCode(QuarnApp) failed to get VisualStudio addin.\r\n"
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnGenerateCode(QuarnApp)\r\n"
+                   " ERROR    ADDIN     kpxAddin.OnGenerateCode(QuarnApp) failed to get VisualStudio addin.\r\n"
+                   " TRACE    ADDIN     kpxAddin.OnComponentAssignment(QuarnApp)\r\n"
                    " ERROR    ADDIN     kpxAddin.OnComponentAssignment(QuarnApp) failed to get VisualStudio addin.\r\n"
                    " TRACE    ADDIN     kpxAddin.OnModelUpdate(QuarnApp).\r\n"
                    " ERROR    ADDIN     kpxAddin.StartModelUpdate(QuarnApp) failed to get VisualStudio addin.\r\n");
