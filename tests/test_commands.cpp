@@ -251,11 +251,15 @@ TEST_F(CommandTest, FaqRunsScriptsOrObjectsAndFallsBackToTheFaqHelpFile) {
   auto noFaq = std::make_shared<FakeObject>("nofaq", nullptr);
   world.factory.makers["Tools.Faq"] = [&] { return noFaq; };
   settings["OnFAQ"] = "Tools.Faq";
+  world.journal.clear();
   api->OnFAQ(a);
   EXPECT_TRUE(world.ui.help.empty());  // no faq-vc.hlp beside the help file
+  // Nothing to show: the host is not asked for a window to show it in.
+  EXPECT_EQ(std::count(world.journal.begin(), world.journal.end(), "app.GetMainWnd"), 0);
   world.files.at("C:\\Quarn\\Help\\faq-vc.hlp") = "";
   api->OnFAQ(a);
   EXPECT_EQ(world.ui.help, (std::vector<std::string>{"C:\\Quarn\\Help\\faq-vc.hlp"}));
+  EXPECT_EQ(std::count(world.journal.begin(), world.journal.end(), "app.GetMainWnd"), 1);
 
   api->OnHowTo(a);
   EXPECT_EQ(world.ui.help.back(), "C:\\Quarn\\Help\\vc.hlp");
