@@ -47,6 +47,7 @@ std::optional<std::string> LookUp(const Properties& p, std::string_view tool, st
 
 DispId HostObject::IdOfName(std::string_view name) {
   world_.log().CountHostCall();
+  ObservedCall call(world_.log().observer());
   for (const MemberName& m : Names())
     if (EqualsNoCase(m.name, name)) return m.id;
   NoMember();
@@ -54,6 +55,7 @@ DispId HostObject::IdOfName(std::string_view name) {
 
 Variant HostObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
   world_.log().CountHostCall();
+  ObservedCall call(world_.log().observer());
   for (const MemberName& m : Names())
     if (m.id == dispId) return Call(dispId, kind, args);
   NoMember();

@@ -695,6 +695,69 @@ void BridgeAgainstHostObjects() {
   CHECK_EQ(locks.objects, 0L);
 }
 
+// Answers "Echo" (1) with its first argument; any other id raises 5.
+class Served final : public kpx::Object {
+ public:
+  kpx::DispId IdOfName(std::string_view name) override {
+    if (name == "Echo") return 1;
+    throw kpx::AutomationError(kpx::vberr::kNoSuchMember);
+  }
+  kpx::Variant Invoke(kpx::DispId id, kpx::CallKind, std::span<kpx::Variant> args) override {
+    if (id != 1) throw kpx::AutomationError(5);
+    return args.empty() ? kpx::Variant() : args[0];
+  }
+};
+
+// Counts the calls it is told of and how deep they nest.
+struct Spans final : kpx::CallObserver {
+  int entered = 0, left = 0, depth = 0, deepest = 0;
+  void Enter() override {
+    ++entered;
+    if (++depth > deepest) deepest = depth;
+  }
+  void Leave() override {
+    ++left;
+    --depth;
+  }
+};
+
+void ObservedServing() {
+  Group("a bridge tells its observer of every call into an object it serves, answered, failed or refused");
+  kpx::win32::ServerLocks locks;
+  Spans spans;
+  {
+    kpx::win32::ComBridge bridge(locks);
+    bridge.Observe(&spans);
+    Ref<IDispatch> served(bridge.Expose(std::make_shared<Served>()));
+    DISPID id = 0;
+    LPOLESTR echo = const_cast<LPOLESTR>(L"Echo");
+    LPOLESTR other = const_cast<LPOLESTR>(L"Other");
+    CHECK_HR(served->GetIDsOfNames(IID_NULL, &echo, 1, 0, &id), S_OK);
+    CHECK_HR(served->GetIDsOfNames(IID_NULL, &other, 1, 0, &id), DISP_E_UNKNOWNNAME);
+    Var arg = Var::I4(7);
+    DISPPARAMS params{&arg.v, nullptr, 1, 0};
+    VARIANT result;
+    VariantInit(&result);
+    CHECK_HR(served->Invoke(1, IID_NULL, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr), S_OK);
+    CHECK(result.vt == VT_I4 && result.lVal == 7);
+    VariantClear(&result);
+    EXCEPINFO info{};
+    CHECK_HR(served->Invoke(2, IID_NULL, 0, DISPATCH_METHOD, &params, &result, &info, nullptr), DISP_E_EXCEPTION);
+    SysFreeString(info.bstrDescription);
+    SysFreeString(info.bstrSource);
+    CHECK_HR(served->Invoke(1, IID_IDispatch, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr),
+             DISP_E_UNKNOWNINTERFACE);
+    CHECK_EQ(spans.entered, 5);
+    CHECK_EQ(spans.left, 5);
+    CHECK_EQ(spans.deepest, 1);
+    bridge.Observe(nullptr);
+    CHECK_HR(served->Invoke(1, IID_NULL, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr), S_OK);
+    VariantClear(&result);
+    CHECK_EQ(spans.entered, 5);
+  }
+  CHECK_EQ(locks.objects, 0L);
+}
+
 void PlatformOverWin32(const Paths& paths) {
   Group("the Win32 platform: resource component early- and late-bound, object creation, registry, files");
   kpx::win32::ServerLocks locks;
@@ -876,6 +939,7 @@ int main(int argc, char** argv) {
   ErrorsToTheHost();
   TokenScannerThroughIDispatch();
   BridgeAgainstHostObjects();
+  ObservedServing();
   PlatformOverWin32(paths);
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);
