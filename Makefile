@@ -5,7 +5,7 @@ NATIVE_DIR := $(BUILD)/native
 WIN64_DIR  := $(BUILD)/win-x64
 WIN32_DIR  := $(BUILD)/win-x86
 
-.PHONY: all setup native windows wintest test demo bench clean
+.PHONY: all setup native windows wintest test demo bench bench-com clean
 
 all: native
 
@@ -40,6 +40,11 @@ bench:
 	cmake -S . -B $(BUILD)/bench -DCMAKE_BUILD_TYPE=Release
 	cmake --build $(BUILD)/bench -j $(JOBS) --target kpx-bench
 	$(BUILD)/bench/bench/kpx-bench
+
+# What COM costs: the host-call benchmarks natively and on the real DLL
+# through IDispatch under Wine, x64 and x86, side by side.
+bench-com:
+	BUILD=$(BUILD) scripts/bench-com.sh
 
 clean:
 	rm -rf $(BUILD)

@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
 # Installs the Debian packages the build and the tests need, when missing.
-# Usage: scripts/setup.sh [native|windows|wine|wine32]...
+# Usage: scripts/setup.sh [native|windows|wine|wine32|bench]...
 #
 # wine32 is Debian's 32-bit Wine (wine32:i386) beside wine64, which runs the
 # x86 DLLs. It needs the i386 architecture and more care than a plain
@@ -16,6 +16,7 @@ for part in "$@"; do
     windows) want+=(g++-mingw-w64-x86-64 g++-mingw-w64-i686 mingw-w64-tools libwine-dev) ;;
     wine) want+=(wine64 xvfb xauth) ;;
     wine32) want+=(wine64); with_wine32=1 ;;
+    bench) want+=(python3) ;;
     *) echo "setup: unknown part '$part'" >&2; exit 2 ;;
   esac
 done
