@@ -824,6 +824,17 @@ void PlatformOverWin32(const Paths& paths) {
                         kpx::platform::kRegDword);
   CHECK(kpx::RegistryQueryValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "number") ==
         kpx::Variant(int32_t{-5}));
+  // Values around the size read in one query, and past it, come back whole.
+  for (size_t length : {size_t{0}, size_t{255}, size_t{256}, size_t{4000}}) {
+    std::string text(length, 'x');
+    for (size_t i = 0; i < length; ++i) text[i] = static_cast<char>('a' + i % 26);
+    kpx::RegistrySetValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "long", kpx::Variant(text),
+                          kpx::platform::kRegSz);
+    raw = world.registry.QueryValue(kpx::platform::RootKey::CurrentUser, key, "long");
+    CHECK(raw && raw->type == kpx::platform::kRegSz && raw->data == text + '\0');
+    if (!raw || raw->data != text + '\0') std::printf("  a value of %zu characters came back wrong\n", length);
+  }
+  CHECK(!world.registry.QueryValue(kpx::platform::RootKey::CurrentUser, key, "absent"));
   // Writing under a missing key creates nothing.
   CHECK(!world.registry.SetValue(kpx::platform::RootKey::CurrentUser, "Software\\kpxtest\\missing", "x",
                                  {kpx::platform::kRegSz, std::string("y\0", 2)}));
