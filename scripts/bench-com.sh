@@ -16,7 +16,7 @@ set -euo pipefail
 cd "$(dirname "$0")/.."
 BUILD=${BUILD:-build}
 read -r -a archs <<<"${KPX_BENCH_ARCHS:-x64 x86}"
-filter=${KPX_BENCH_FILTER:-'BM_(Name|EnableClassMenuOneClass|Activate)/'}
+filter=${KPX_BENCH_FILTER:-'BM_(Name|EnableClassMenuOneClass|Activate)/|BM_Platform'}
 jobs=$(nproc 2>/dev/null || echo 2)
 root=$(realpath -m "$BUILD")
 out="$root/bench-com"

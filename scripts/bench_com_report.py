@@ -68,6 +68,14 @@ def main(paths):
                 if ratio > GOAL:
                     missed.append("%s %s (%.1fx)" % (title, name, ratio))
             print(line)
+    platform = [("BM_PlatformRegistryRead", "registry value read"), ("BM_PlatformCreateKey", "registry key created"),
+                ("BM_PlatformFileExists", "file existence test"), ("BM_PlatformDoEvents", "DoEvents (message loop)")]
+    if any(n + "" in runs for _, runs in sides[1:] for n, _ in platform):
+        print()
+        print("The DLL's platform calls under Wine, ns each (OnActivate makes several):")
+        for member, title in platform:
+            cells = ["%s %s" % (name, ns(runs[member][0]).strip()) for name, runs in sides[1:] if member in runs]
+            print("  %-26s %s" % (title, "   ".join(cells)))
     print()
     if missed:
         print("Over %.0fx the native add-in's own share: %s" % (GOAL, "; ".join(missed)))

@@ -241,7 +241,7 @@ int Main(int argc, char** argv) {
   RemoveJournaled();
 
   std::ofstream(argv[3], std::ios::binary) << jsonl;
-  std::set<std::string> served = {Lower(kResourceProgId), Lower(kResourceClsid)};
+  std::set<std::string> served = {Lower(wintest::kResourceProgId), Lower(wintest::kResourceClsid)};
   for (const auto& c : model.companions) {
     if (!c->progid.empty()) served.insert(Lower(c->progid));
     if (!c->clsid.empty()) served.insert(Lower(c->clsid));
