@@ -6,7 +6,8 @@ architecture (x64.json, x86.json).
 
 Per member: the time of a call (plain run), the host's share (host_ns of
 the metered run), the add-in's own share (the one less the other) and, for
-the DLL, its own share over the native add-in's own share."""
+the DLL, its own share over the native add-in's own share. Of repeated runs
+the shortest counts: on a busy machine the others carry waiting time."""
 
 import json
 import os
@@ -21,12 +22,20 @@ GOAL = 2.0
 def load(path):
     with open(path) as f:
         data = json.load(f)
+    # Of repeated runs, the least disturbed: the shortest time, and the
+    # smallest host share, each on its own.
     runs = {}
     for b in data["benchmarks"]:
-        if b.get("error_occurred"):
+        if b.get("error_occurred") or b.get("run_type") == "aggregate":
             continue
         scale = {"ns": 1.0, "us": 1e3, "ms": 1e6, "s": 1e9}[b.get("time_unit", "ns")]
-        runs[b["name"]] = (b["real_time"] * scale, b.get("host_ns"), b.get("hostCalls"))
+        name = b.get("run_name", b["name"])
+        time, host = b["real_time"] * scale, b.get("host_ns")
+        if name in runs:
+            old = runs[name]
+            time = min(time, old[0])
+            host = min(host, old[1]) if host is not None and old[1] is not None else host
+        runs[name] = (time, host, b.get("hostCalls"))
     return runs
 
 
