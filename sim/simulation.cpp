@@ -30,6 +30,9 @@ void Simulation::Prepare() {
   if (prepared_) return;
   prepared_ = true;
   SeedRegistry(env_.registry, model_.registry);
+  // Every Windows machine has a drive C, files or not: a debug log at its
+  // root ("C:\tzndebuglog.txt", the logger's default) can be written.
+  env_.seeder.MakeFolder("C:\\");
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
   for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);
   clock_.Set(model_.clock);
