@@ -37,6 +37,8 @@ CompanionObject::CompanionObject(World& world, std::shared_ptr<const CompanionDe
     names_.push_back(name);
   };
   for (const std::string& op : def_->operations) add(op);
+  for (const auto& [iid, members] : def_->interfaces)
+    for (const std::string& m : members) add(m);
   for (const auto& [name, member] : def_->members) add(name);
 }
 
@@ -61,13 +63,55 @@ DispId CompanionObject::IdOfOwnOperation(int position) {
   throw error;
 }
 
+namespace {
+
+// A companion seen through another of its interfaces: that interface's
+// members only, with the companion's own dispatch ids and answers.
+class CompanionInterface final : public SimObject {
+ public:
+  CompanionInterface(std::shared_ptr<CompanionObject> owner, std::string iid, const std::vector<std::string>& members)
+      : owner_(std::move(owner)), iid_(std::move(iid)), members_(members) {}
+  std::string label() const override { return owner_->label(); }
+
+  DispId IdOfName(std::string_view name) override {
+    for (const std::string& m : members_)
+      if (EqualsNoCase(m, name)) return owner_->IdOfName(m);
+    throw AutomationError(vberr::kNoSuchMember);
+  }
+  DispId IdOfOwnOperation(int position) override {
+    if (position < 1 || static_cast<size_t>(position) > members_.size()) throw AutomationError(vberr::kNoSuchMember);
+    return owner_->IdOfName(members_[static_cast<size_t>(position - 1)]);
+  }
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override {
+    return owner_->InvokeThrough(&iid_, id, kind, args);
+  }
+
+ private:
+  std::shared_ptr<CompanionObject> owner_;
+  std::string iid_;
+  const std::vector<std::string>& members_;
+};
+
+}  // namespace
+
+ObjectPtr CompanionObject::QueryInterface(std::string_view iid) {
+  auto it = def_->interfaces.find(iid);
+  if (it == def_->interfaces.end()) throw AutomationError(vberr::kTypeMismatch);
+  return std::make_shared<CompanionInterface>(shared_from_this(), it->first, it->second);
+}
+
 Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
+  return InvokeThrough(nullptr, dispId, kind, args);
+}
+
+Variant CompanionObject::InvokeThrough(const std::string* iid, DispId dispId, CallKind kind, std::span<Variant> args) {
   if (dispId < 1 || static_cast<size_t>(dispId) > names_.size()) throw AutomationError(vberr::kNoSuchMember);
   const std::string& name = names_[static_cast<size_t>(dispId - 1)];
   EventLog& log = world_.log();
 
   EventJson call{{"ev", "companion-call"}, {"instance", label_}, {"member", name}, {"kind", KindName(kind)}};
-  for (size_t i = 0; i < def_->operations.size(); ++i)
+  if (iid) call["interface"] = *iid;
+  for (size_t i = 0; !iid && i < def_->operations.size(); ++i)
     if (EqualsNoCase(def_->operations[i], name)) {
       call["operation"] = i + 1;
       break;

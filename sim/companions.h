@@ -20,7 +20,7 @@ class World;
 
 // A scripted companion: its members answer, raise and write back arguments
 // as the model file describes it; a member it does not list raises 438.
-class CompanionObject final : public SimObject {
+class CompanionObject final : public SimObject, public std::enable_shared_from_this<CompanionObject> {
  public:
   CompanionObject(World& world, std::shared_ptr<const CompanionDef> def, std::string label);
   std::string label() const override { return label_; }
@@ -28,6 +28,12 @@ class CompanionObject final : public SimObject {
   DispId IdOfName(std::string_view name) override;
   DispId IdOfOwnOperation(int position) override;
   Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+  // One of the interfaces the model file lists for it; 13 for any other.
+  ObjectPtr QueryInterface(std::string_view iid) override;
+
+  // A call through one of its other interfaces: recorded with that interface.
+  Variant InvokeThrough(const std::string* iid, DispId id, CallKind kind, std::span<Variant> args);
+  const CompanionDef& def() const { return *def_; }
 
   // One of its named sub-objects, made on first use and kept.
   ObjectPtr SubObject(const std::string& name);

@@ -517,7 +517,7 @@ class ModelReader {
   std::shared_ptr<const CompanionDef> ReadCompanion(const Node& n, bool creatable) {
     auto c = std::make_shared<CompanionDef>();
     if (creatable) {
-      n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "members", "objects"});
+      n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "interfaces", "members", "objects"});
       c->progid = n.StringOr("progid", "");
       c->clsid = n.StringOr("clsid", "");
       if (c->progid.empty() && c->clsid.empty()) n.Fail("a companion needs a \"progid\" or a \"clsid\"");
@@ -530,10 +530,17 @@ class ModelReader {
         }
       }
     } else {
-      n.ExpectKeys({"comment", "operations", "members", "objects"});
+      n.ExpectKeys({"comment", "operations", "interfaces", "members", "objects"});
     }
     if (auto ops = n.Find("operations"))
       for (const Node& op : ops->Elements()) c->operations.push_back(op.String());
+    if (auto ifs = n.Find("interfaces"))
+      for (const auto& [iid, list] : ifs->Members()) {
+        if (iid.size() != 38 || iid.front() != '{' || iid.back() != '}')
+          ifs->FailKey(iid, "an interface id is written \"{XXXXXXXX-XXXX-XXXX-XXXX-XXXXXXXXXXXX}\"");
+        std::vector<std::string>& members = c->interfaces[iid];
+        for (const Node& m : list.Elements()) members.push_back(m.String());
+      }
     if (auto objs = n.Find("objects"))
       for (const auto& [name, def] : objs->Members()) c->objects[name] = ReadCompanion(def, false);
     if (auto members = n.Find("members"))

@@ -66,6 +66,8 @@ struct CompanionDef {
   std::string clsid;
   std::optional<ErrorDef> createError;
   std::vector<std::string> operations;  // its own interface, in order
+  // Its other interfaces, by interface id: each one's members, in order.
+  std::map<std::string, std::vector<std::string>, NoCaseLess> interfaces;
   std::map<std::string, MemberDef, NoCaseLess> members;
   std::map<std::string, std::shared_ptr<const CompanionDef>> objects;
 

@@ -1,10 +1,13 @@
 #include "sim/simulation.h"
 
+#include "automation/dictionary.h"
 #include "automation/error_styles.h"
+#include "shared/token_scanner_object.h"
 
 namespace kpx::sim {
 
-Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn)
+Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn,
+                       ScenarioObjectFactories makeObjects)
     : model_(model),
       env_(environment),
       world_(model, log_),
@@ -17,8 +20,12 @@ Simulation::Simulation(const ModelDef& model, Environment environment, AddInFact
       objects_(factory_, log_),
       platform_{registry_, files_, recordingClock_, objects_, ui_},
       module_(platform_),
-      makeAddIn_(std::move(makeAddIn)) {
+      makeAddIn_(std::move(makeAddIn)),
+      makeObjects_(std::move(makeObjects)) {
   if (!makeAddIn_) makeAddIn_ = [this]() -> ObjectPtr { return CreateApi(module_); };
+  if (!makeObjects_.scanner)
+    makeObjects_.scanner = [this]() -> ObjectPtr { return std::make_shared<TokenScannerObject>(module_.platform().objects); };
+  if (!makeObjects_.dictionary) makeObjects_.dictionary = []() -> ObjectPtr { return std::make_shared<Dictionary>(); };
 }
 
 Simulation::~Simulation() {
@@ -78,7 +85,13 @@ void Simulation::Apply(const Action& a) {
       Call(a);
       break;
     case Action::Type::Create:
-      Create();
+      if (a.object.empty())
+        Create();
+      else
+        MakeObject(a);
+      break;
+    case Action::Type::Use:
+      Use(a);
       break;
     case Action::Type::Release:
       Release(false);
@@ -158,6 +171,65 @@ void Simulation::Call(const Action& a) {
               {"description", e.description()},
               {"hostCalls", log_.hostCalls() - before}});
   }
+}
+
+// The scenario's own objects are not the host's: their calls are no host
+// calls, and an object they answer is shown only as there or not (the same
+// dictionary is a different wrapper each time it crosses COM).
+namespace {
+
+EventJson ShownValue(const EventLog& log, const Variant& v) {
+  if (v.isObject()) return {{"object", v.isNothing() ? EventJson() : EventJson(true)}};
+  return log.Value(v);
+}
+
+const char* KindText(CallKind kind) {
+  switch (kind) {
+    case CallKind::PropertyGet: return "get";
+    case CallKind::PropertyPut: return "put";
+    case CallKind::PropertyPutRef: return "putref";
+    default: return "method";
+  }
+}
+
+}  // namespace
+
+void Simulation::MakeObject(const Action& a) {
+  const bool scanner = a.object == "kpxAddIn.TokenScanner";
+  EventJson ev{{"ev", "create"}, {"object", a.object}};
+  try {
+    (scanner ? scanner_ : dictionary_) = (scanner ? makeObjects_.scanner : makeObjects_.dictionary)();
+    ev["ok"] = true;
+  } catch (...) {
+    (scanner ? scanner_ : dictionary_) = nullptr;
+    ev["ok"] = false;
+    ev["error"] = ErrorJson(CurrentError());
+  }
+  log_.Add(std::move(ev));
+}
+
+void Simulation::Use(const Action& a) {
+  const ObjectPtr& target = a.object == "scanner" ? scanner_ : dictionary_;
+  EventJson ev{{"ev", a.object + "-call"}, {"member", a.member}, {"kind", KindText(a.kind)}};
+  std::vector<Variant> args;
+  EventJson shown = EventJson::array();
+  for (const InputJson& arg : a.args) {
+    args.push_back(arg.is_string() && arg.get<std::string>() == "$dictionary" ? Variant(dictionary_)
+                                                                               : world_.ToVariant(arg));
+    shown.push_back(ShownValue(log_, args.back()));
+  }
+  ev["args"] = std::move(shown);
+  if (!target) {
+    ev["skipped"] = "its creation failed";
+    log_.Add(std::move(ev));
+    return;
+  }
+  try {
+    ev["result"] = ShownValue(log_, target->Invoke(target->IdOfName(a.member), a.kind, args));
+  } catch (...) {
+    ev["error"] = ErrorJson(CurrentError());
+  }
+  log_.Add(std::move(ev));
 }
 
 }  // namespace kpx::sim

@@ -30,10 +30,20 @@ struct Environment {
 // instead. Throws AutomationError when the object cannot be made.
 using AddInFactory = std::function<ObjectPtr()>;
 
+// How the scenario's own objects are made: the add-in's token scanner and a
+// keyed collection. Left empty, in this process (the scanner on the
+// simulation's own module); a COM test host makes the real DLL's scanner and
+// the system's dictionary instead.
+struct ScenarioObjectFactories {
+  std::function<ObjectPtr()> scanner;
+  std::function<ObjectPtr()> dictionary;
+};
+
 class Simulation {
  public:
   // `model` must outlive the simulation.
-  Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn = {});
+  Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn = {},
+             ScenarioObjectFactories makeObjects = {});
   ~Simulation();
   Simulation(const Simulation&) = delete;
   Simulation& operator=(const Simulation&) = delete;
@@ -60,6 +70,8 @@ class Simulation {
 
  private:
   void Call(const Action& action);
+  void MakeObject(const Action& action);
+  void Use(const Action& action);
 
   const ModelDef& model_;
   Environment env_;
@@ -76,7 +88,9 @@ class Simulation {
   platform::Platform platform_;
   Module module_;
   AddInFactory makeAddIn_;
+  ScenarioObjectFactories makeObjects_;
   ObjectPtr api_;
+  ObjectPtr scanner_, dictionary_;
   bool prepared_ = false;
 };
 

@@ -403,15 +403,20 @@ class HostView final : public Object {
 };
 
 // The add-in as the Quarn host makes it: by its ProgID, through COM.
-ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
+// An in-process object by ProgID, as an Object of this host.
+ObjectPtr CreateByProgId(win32::ComBridge& bridge, const wchar_t* progId) {
   CLSID clsid;
   IDispatch* d = nullptr;
-  HRESULT hr = CLSIDFromProgID(L"kpxAddIn.API", &clsid);
+  HRESULT hr = CLSIDFromProgID(progId, &clsid);
   if (SUCCEEDED(hr)) hr = CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, IID_IDispatch, reinterpret_cast<void**>(&d));
   if (FAILED(hr)) throw ErrorOfCreation(hr);
-  ObjectPtr api = bridge.Adopt(d);
+  ObjectPtr object = bridge.Adopt(d);
   d->Release();
-  return std::make_shared<HostView>(std::move(api));
+  return object;
+}
+
+ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
+  return std::make_shared<HostView>(CreateByProgId(bridge, L"kpxAddIn.API"));
 }
 
 // ------------------------------------------------------------ comparing
@@ -566,7 +571,11 @@ int Main(int argc, char** argv) {
     // The host's bridge outlives the simulation: the add-in object the
     // simulation holds came through it.
     std::unique_ptr<Host> host;
-    Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); });
+    // The scenario's token scanner is the DLL's, its dictionary the
+    // Scripting Runtime's.
+    ScenarioObjectFactories objects{[&host] { return CreateByProgId(host->bridge, L"kpxAddIn.TokenScanner"); },
+                                    [&host] { return CreateByProgId(host->bridge, L"Scripting.Dictionary"); }};
+    Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); }, objects);
     host = std::make_unique<Host>(model, sim.platform().objects);
     host->RegisterAll();
     {
