@@ -185,25 +185,41 @@ ObjectPtr CompanionObject::ReturnedObject(const std::string& member, const std::
 
 // ------------------------------------------------------------ ResourceObject
 
+namespace {
+constexpr DispId kLoadResString = 1;
+constexpr DispId kGetString = 2;
+}  // namespace
+
 DispId ResourceObject::IdOfName(std::string_view name) {
-  if (EqualsNoCase(name, "GetString")) return 1;
+  if (EqualsNoCase(name, "LoadResString")) return kLoadResString;
+  if (EqualsNoCase(name, "GetString")) return kGetString;
   throw AutomationError(vberr::kNoSuchMember);
 }
 
 DispId ResourceObject::IdOfOwnOperation(int position) {
-  if (position == 1) return 1;
+  if (position == 1 || position == 2) return position;
   throw AutomationError(vberr::kNoSuchMember);
 }
 
 Variant ResourceObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
-  if (dispId != 1 || (kind != CallKind::Method && kind != CallKind::PropertyGet))
+  if ((dispId != kLoadResString && dispId != kGetString) || (kind != CallKind::Method && kind != CallKind::PropertyGet))
     throw AutomationError(vberr::kNoSuchMember);
   if (args.size() != 1) throw AutomationError(vberr::kWrongArgCount);
-  return Text(args[0].toInt32());
+  const int32_t id = args[0].toInt32();
+  if (model_.faults.missingResources.count(id)) {
+    const AutomationError error(326, "Resource with identifier '" + std::to_string(id) + "' not found");
+    log_.Add({{"ev", "fault"},
+              {"object", label_},
+              {"member", dispId == kLoadResString ? "LoadResString" : "GetString"},
+              {"args", EventJson::array({id})},
+              {"error", ErrorJson(error)}});
+    throw error;
+  }
+  return Text(id);
 }
 
 std::string ResourceObject::Text(int32_t id) const {
-  if (auto it = overrides_.find(id); it != overrides_.end()) return it->second;
+  if (auto it = model_.resources.find(id); it != model_.resources.end()) return it->second;
   if (const char* text = FindResourceText(id)) return text;
   // As the resource component answers an id it has no text for.
   throw AutomationError(326, "Resource with identifier '" + std::to_string(id) + "' not found");
@@ -214,8 +230,8 @@ std::string ResourceObject::Text(int32_t id) const {
 ObjectPtr SimObjectFactory::MakeResource() {
   if (!world_.def().resourceRegistered) throw AutomationError(vberr::kCantCreateObject);
   const std::string base(kResourceProgId);
-  return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)),
-                                          world_.def().resources);
+  return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)), world_.def(),
+                                          world_.log());
 }
 
 ObjectPtr SimObjectFactory::MakeCompanion(const std::shared_ptr<const CompanionDef>& def) {

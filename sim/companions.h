@@ -51,11 +51,13 @@ class CompanionObject final : public SimObject, public std::enable_shared_from_t
 };
 
 // The resource component: texts by string id, from the model file's
-// overrides first, then from the add-in's own resource table.
+// overrides first, then from the add-in's own resource table. Its first own
+// operation is LoadResString (the id by value), its second GetString (the id
+// by reference). An id the model takes away raises 326 and is recorded.
 class ResourceObject final : public SimObject {
  public:
-  ResourceObject(std::string label, const std::map<int32_t, std::string>& overrides)
-      : label_(std::move(label)), overrides_(overrides) {}
+  ResourceObject(std::string label, const ModelDef& model, EventLog& log)
+      : label_(std::move(label)), model_(model), log_(log) {}
   std::string label() const override { return label_; }
 
   DispId IdOfName(std::string_view name) override;
@@ -66,7 +68,8 @@ class ResourceObject final : public SimObject {
 
  private:
   std::string label_;
-  const std::map<int32_t, std::string>& overrides_;
+  const ModelDef& model_;
+  EventLog& log_;
 };
 
 // Creates companions and resource objects by ProgID or class id, as the

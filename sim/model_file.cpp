@@ -3,9 +3,11 @@
 #include <algorithm>
 #include <cctype>
 #include <limits>
+#include <tuple>
 
 #include "automation/automation_error.h"
 #include "automation/vb_strings.h"
+#include "sim/faults.h"
 
 namespace kpx::sim {
 
@@ -112,17 +114,6 @@ std::string HexBytes(const Node& n) {
   return data;
 }
 
-platform::RegistryValue RegistryValueOf(const Node& n) {
-  if (n.IsString()) return {platform::kRegSz, n.String() + '\0'};
-  if (n.json().is_number()) return {platform::kRegDword, DwordBytes(DwordOf(n))};
-  if (!n.IsObject() || n.json().size() != 1)
-    n.Fail("a registry value is a string, a number, or one of {\"sz\": ...}, {\"dword\": ...}, {\"binary\": ...}");
-  n.ExpectKeys({"sz", "dword", "binary"});
-  if (auto sz = n.Find("sz")) return {platform::kRegSz, sz->String() + '\0'};
-  if (auto dw = n.Find("dword")) return {platform::kRegDword, DwordBytes(DwordOf(*dw))};
-  return {platform::kRegBinary, HexBytes(n.Member("binary"))};
-}
-
 int ParseNumberPart(const Node& n, const std::string& text, size_t pos, size_t len, int lo, int hi) {
   if (pos + len > text.size()) n.Fail("malformed \"" + text + "\"");
   int v = 0;
@@ -142,23 +133,37 @@ int DaysInMonth(int year, int month) {
 
 }  // namespace
 
+platform::RegistryValue ParseRegistryValue(const Node& n) {
+  if (n.IsString()) return {platform::kRegSz, n.String() + '\0'};
+  if (n.json().is_number()) return {platform::kRegDword, DwordBytes(DwordOf(n))};
+  if (!n.IsObject() || n.json().size() != 1)
+    n.Fail("a registry value is a string, a number, or one of {\"sz\": ...}, {\"dword\": ...}, {\"binary\": ...}");
+  n.ExpectKeys({"sz", "dword", "binary"});
+  if (auto sz = n.Find("sz")) return {platform::kRegSz, sz->String() + '\0'};
+  if (auto dw = n.Find("dword")) return {platform::kRegDword, DwordBytes(DwordOf(*dw))};
+  return {platform::kRegBinary, HexBytes(n.Member("binary"))};
+}
+
+std::pair<platform::RootKey, std::string> ParseRegistryKey(const Node& registry, const std::string& fullKey) {
+  const size_t slash = fullKey.find('\\');
+  std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
+  if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
+    registry.FailKey(fullKey,
+                     "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+  return {*root, fullKey.substr(slash + 1)};
+}
+
 std::vector<RegistryEntry> ParseRegistry(const Node& node) {
   std::vector<RegistryEntry> out;
   for (const auto& [fullKey, values] : node.Members()) {
-    const size_t slash = fullKey.find('\\');
-    std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
-    if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
-      node.FailKey(fullKey,
-                   "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
-    values.ExpectObject("an object of values");
     RegistryEntry keyOnly;
-    keyOnly.root = *root;
-    keyOnly.key = fullKey.substr(slash + 1);
+    std::tie(keyOnly.root, keyOnly.key) = ParseRegistryKey(node, fullKey);
+    values.ExpectObject("an object of values");
     out.push_back(keyOnly);
     for (const auto& [name, value] : values.Members()) {
       RegistryEntry e = keyOnly;
       e.name = name == "@" ? "" : name;
-      e.value = RegistryValueOf(value);
+      e.value = ParseRegistryValue(value);
       out.push_back(std::move(e));
     }
   }
@@ -251,7 +256,7 @@ class ModelReader {
 
   ModelDef Read() {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
-                      "resources", "resourceComponent", "model"});
+                      "resources", "resourceComponent", "model", "faults"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
     if (auto n = root_.Find("files")) ReadFiles(*n);
     if (auto n = root_.Find("folders"))
@@ -269,6 +274,8 @@ class ModelReader {
     if (auto n = root_.Find("addins")) ReadAddIns(*n);
     if (auto n = root_.Find("companions"))
       for (const Node& c : n->Elements()) m_.companions.push_back(ReadCompanion(c, true));
+    // Last: faults name add-ins, elements and registry keys.
+    if (auto n = root_.Find("faults")) ReadFaults(*n, m_);
     return std::move(m_);
   }
 

@@ -13,8 +13,9 @@ Simulation::Simulation(const ModelDef& model, Environment environment, AddInFact
       world_(model, log_),
       ui_(log_),
       factory_(world_),
-      debugLog_(platform::Platform{env_.registry, env_.files, clock_, factory_, ui_}),
-      registry_(env_.registry, log_),
+      faultyRegistry_(env_.registry, model.faults),
+      debugLog_(platform::Platform{faultyRegistry_, env_.files, clock_, factory_, ui_}),
+      registry_(env_.registry, log_, model.faults),
       files_(env_.files, log_, debugLog_),
       recordingClock_(clock_, log_),
       objects_(factory_, log_),
@@ -37,6 +38,9 @@ void Simulation::Prepare() {
   if (prepared_) return;
   prepared_ = true;
   SeedRegistry(env_.registry, model_.registry);
+  // Every Windows machine has a drive C, files or not: a debug log at its
+  // root ("C:\tzndebuglog.txt", the logger's default) can be written.
+  env_.seeder.MakeFolder("C:\\");
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
   for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);
   clock_.Set(model_.clock);

@@ -10,6 +10,7 @@
 #include "shared/module.h"
 #include "sim/companions.h"
 #include "sim/event_log.h"
+#include "sim/faults.h"
 #include "sim/model_file.h"
 #include "sim/scenario_file.h"
 #include "sim/sim_platform.h"
@@ -80,6 +81,7 @@ class Simulation {
   VirtualClock clock_;
   SimUserInterface ui_;
   SimObjectFactory factory_;
+  FaultyRegistry faultyRegistry_;  // unrecorded: for finding the debug log
   DebugLogLocator debugLog_;
   RecordingRegistry registry_;
   RecordingFileSystem files_;

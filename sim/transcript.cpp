@@ -121,16 +121,22 @@ std::string TranscriptLine(const EventJson& e) {
   }
   if (ev == "error") return Line("error", Str(e, "member") + " raised " + ErrorText(e) + hostCalls);
   if (ev == "skip") return Line("skip", Str(e, "member") + " (" + Str(e, "reason") + ")");
+  const std::string injected = e.value("fault", false) ? "   [injected]" : "";
   if (ev == "registry-read") {
     const std::string value =
         F(e, "value").is_null() ? "(missing)" : RegistryValueText(F(e, "value")) + " (" + Str(e, "type") + ")";
-    return Line("reg read", RegistryPlace(e) + " = " + value);
+    return Line("reg read", RegistryPlace(e) + " = " + value + injected);
   }
   if (ev == "registry-write")
     return Line("reg write", RegistryPlace(e) + " := " + RegistryValueText(F(e, "value")) + " (" + Str(e, "type") +
                                  ")" + (e.value("written", false) ? "" : " NOT WRITTEN"));
   if (ev == "registry-create")
-    return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition"));
+    return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition") + injected);
+  if (ev == "fault") {
+    const std::string call = e.contains("call") ? " (call " + Str(e, "call") + ")" : "";
+    return Line("fault", Str(e, "object") + "." + Str(e, "member") + "(" + Args(F(e, "args")) + ")" + call +
+                             " raised " + ErrorText(F(e, "error")));
+  }
   if (ev == "file-exists")
     return Line("file", "exists " + Str(e, "path") + "? " + (e.value("exists", false) ? "yes" : "no"));
   if (ev == "file-delete")
@@ -197,10 +203,11 @@ std::string Transcript(const std::vector<EventJson>& events, const std::string& 
   std::map<std::string, uint64_t> calls, hostCalls, errors;
   std::vector<std::string> addins, debugLines;
   uint64_t regRead = 0, regMissing = 0, regWritten = 0, keysCreated = 0, hostLog = 0, companionCalls = 0, deletes = 0,
-           appends = 0, objects = 0, failedObjects = 0, debugFailed = 0;
+           appends = 0, objects = 0, failedObjects = 0, debugFailed = 0, faults = 0;
   for (const EventJson& e : events) {
     out << TranscriptLine(e) << '\n';
     const std::string ev = Str(e, "ev"), member = Str(e, "member");
+    if (ev == "fault" || e.value("fault", false)) ++faults;
     if (ev == "call") {
       if (!calls.count(member)) members.push_back(member);
       ++calls[member];
@@ -259,6 +266,7 @@ std::string Transcript(const std::vector<EventJson>& events, const std::string& 
                      Plural(companionCalls, "companion call", "companion calls"));
   row("files", Plural(deletes, "deleted", "deleted") + ", " + Plural(appends, "other append", "other appends"));
   row("host log", Plural(hostLog, "line", "lines"));
+  if (faults) row("faults", Plural(faults, "injected failure met", "injected failures met"));
   row("debug log", Plural(debugLines.size(), "line written", "lines written") +
                        (debugFailed ? ", " + Plural(debugFailed, "write failed", "writes failed") : ""));
   for (const std::string& line : debugLines) out << "    " << line << '\n';

@@ -45,6 +45,7 @@ std::vector<std::pair<HKEY, std::string>> TreesOf(const ModelDef& model, const S
   for (const RegistryEntry& e : model.registry) add(e);
   for (const Action& a : scenario.actions)
     for (const RegistryEntry& e : a.registry) add(e);
+  for (const RegistryFaultDef& f : model.faults.registry) add(RegistryEntry{f.root, f.key, std::nullopt, {}});
   return trees;
 }
 
