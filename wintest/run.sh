@@ -166,7 +166,7 @@ differential() {
     case $rc in
       0) same[$arch]=$((same[$arch] + 1)) ;;
       3) skipped[$arch]=$((skipped[$arch] + 1))
-         echo "wintest: $arch: scenario $name skipped: $(tr -d '\r' <"$out/$name.txt" | sed 's/^ *//')" ;;
+         echo "wintest: $arch: scenario $name skipped: $(tr -d '\r' <"$out/$name.txt" | sed 's/^ *//; s/^skipped: //')" ;;
       *) differ[$arch]=$((differ[$arch] + 1))
          echo "wintest: $arch: scenario $name differs from the native run (exit $rc):"
          tr -d '\r' <"$out/$name.txt" ;;
