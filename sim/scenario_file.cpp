@@ -36,6 +36,16 @@ constexpr UsableMember kDictionaryMembers[] = {{"Add", false},    {"Exists", fal
                                                {"RemoveAll", false}, {"Count", true}, {"Item", true},
                                                {"CompareMode", true}};
 
+// A call's "kind": "method" or "get"; "put" and "putref" too where writes are allowed.
+CallKind ReadKind(const Node& k, bool writes) {
+  const std::string kind = k.String();
+  if (kind == "method") return CallKind::Method;
+  if (kind == "get") return CallKind::PropertyGet;
+  if (writes && kind == "put") return CallKind::PropertyPut;
+  if (writes && kind == "putref") return CallKind::PropertyPutRef;
+  k.Fail(writes ? "a kind is \"method\", \"get\", \"put\" or \"putref\"" : "a call's kind is \"method\" or \"get\"");
+}
+
 // {"scanner": "Member", "args": [...], "kind": "..."}: a property is read
 // without arguments and written with them (put; putref for an object).
 void ReadUse(const Node& n, const ModelDef& model, Action& a) {
@@ -63,19 +73,7 @@ void ReadUse(const Node& n, const ModelDef& model, Action& a) {
                                                                             : CallKind::PropertyPut;
   else if (member->property)
     a.kind = CallKind::PropertyGet;
-  if (auto k = n.Find("kind")) {
-    const std::string kind = k->String();
-    if (kind == "method")
-      a.kind = CallKind::Method;
-    else if (kind == "get")
-      a.kind = CallKind::PropertyGet;
-    else if (kind == "put")
-      a.kind = CallKind::PropertyPut;
-    else if (kind == "putref")
-      a.kind = CallKind::PropertyPutRef;
-    else
-      k->Fail("a kind is \"method\", \"get\", \"put\" or \"putref\"");
-  }
+  if (auto k = n.Find("kind")) a.kind = ReadKind(*k, true);
 }
 
 const ApiMember* FindMember(std::string_view name) {
@@ -91,15 +89,7 @@ void ReadCall(const Node& n, const ModelDef& model, Action& a) {
   if (!member) name.Fail("the add-in has no member \"" + name.String() + "\"");
   a.member = member->name;
   a.kind = member->kind;
-  if (auto k = n.Find("kind")) {
-    const std::string kind = k->String();
-    if (kind == "method")
-      a.kind = CallKind::Method;
-    else if (kind == "get")
-      a.kind = CallKind::PropertyGet;
-    else
-      k->Fail("a call's kind is \"method\" or \"get\"");
-  }
+  if (auto k = n.Find("kind")) a.kind = ReadKind(*k, false);
   size_t required = 0;
   for (size_t i = 0; i < member->paramCount; ++i)
     if (!member->params[i].optional) required = i + 1;
