@@ -1,12 +1,12 @@
 // The simulator's input files are JSON written by hand. Every fault in them
-// must name its line, so each file is kept with an index from JSON pointers
-// to the lines where values and object keys start.
+// must name its line. Lines are found when a fault is reported, by walking
+// the text again to the value: an index of every value's line would cost
+// more memory than the parsed file itself, for answers needed once.
 #pragma once
 
 #include <cstdint>
 #include <filesystem>
 #include <initializer_list>
-#include <map>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <stdexcept>
@@ -34,14 +34,21 @@ class InputError : public std::runtime_error {
   std::string message_;
 };
 
-// One parsed JSON file and where each of its values starts.
+// One parsed JSON file, with its text for finding lines.
 class JsonSource {
  public:
-  // Parses `text`; a syntax error, a duplicate key or a top level that is
-  // not an object raises InputError at its line. `name` is how errors name
-  // the file.
+  // Lists and objects nest at most this deep. Deeper files are refused:
+  // the values are copied and written out by recursion later.
+  static constexpr size_t kMaxDepth = 512;
+  // Larger files are refused rather than read into memory.
+  static constexpr uintmax_t kMaxBytes = uintmax_t{1} << 30;
+
+  // Parses `text`; a syntax error, a number out of range, nesting deeper
+  // than kMaxDepth, a duplicate key or a top level that is not an object
+  // raises InputError at its line. `name` is how errors name the file.
   JsonSource(std::string name, std::string text);
-  // Reads and parses a file; an unreadable file is an InputError at line 0.
+  // Reads and parses a file; a file that cannot be read (a folder, a
+  // missing file, one larger than kMaxBytes) is an InputError at line 0.
   static JsonSource Load(const std::filesystem::path& file);
 
   const std::string& name() const { return name_; }
@@ -51,14 +58,17 @@ class JsonSource {
   // The line of the key that names the member at `pointer`; its value's line
   // for array elements and the root.
   int KeyLineOf(const std::string& pointer) const;
+  // The lines of the elements of the list at `pointer`, found in one walk.
+  std::vector<int> ElementLines(const std::string& pointer) const;
 
  private:
-  void Index();
+  // Where a value lies: at each level, the place of the member or element
+  // among its siblings.
+  using Route = std::vector<size_t>;
+  std::optional<Route> RouteOf(const std::string& pointer) const;
   std::string name_;
   std::string text_;
   InputJson root_;
-  std::map<std::string, int> valueLines_;
-  std::map<std::string, int> keyLines_;
 };
 
 // Appends one reference token to a JSON pointer, escaped.
