@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <cctype>
+#include <cmath>
 #include <limits>
 
 #include "automation/automation_error.h"
 #include "automation/vb_strings.h"
+#include "sim/windows_path.h"
 
 namespace kpx::sim {
 
@@ -21,15 +23,24 @@ const MemberDef* CompanionDef::FindMember(std::string_view name) const {
 }
 
 const ElementDef* ModelDef::FindElement(std::string_view key) const {
-  for (const ElementDef& e : elements)
-    if (e.key == key) return &e;
-  return nullptr;
+  auto it = elementIndex_.find(std::string(key));
+  return it == elementIndex_.end() ? nullptr : &elements[it->second];
 }
 
 const AddInDef* ModelDef::FindAddIn(std::string_view id) const {
-  for (const AddInDef& a : addins)
-    if (a.id == id) return &a;
-  return nullptr;
+  auto it = addinIndex_.find(std::string(id));
+  return it == addinIndex_.end() ? nullptr : &addins[it->second];
+}
+
+bool ModelDef::AddElement(ElementDef element) {
+  if (!elementIndex_.emplace(element.key, elements.size()).second) return false;
+  elements.push_back(std::move(element));
+  return true;
+}
+
+void ModelDef::AddAddIn(AddInDef addin) {
+  addinIndex_.emplace(addin.id, addins.size());
+  addins.push_back(std::move(addin));
 }
 
 const std::vector<std::string_view>& ElementKinds() {
@@ -71,6 +82,9 @@ std::optional<platform::RootKey> RootOf(std::string_view name) {
   return std::nullopt;
 }
 
+// The longest name of one key, as Windows allows.
+constexpr size_t kMaxKeyPart = 255;
+
 std::string DwordBytes(uint32_t u) {
   std::string data;
   for (int i = 0; i < 4; ++i) data.push_back(static_cast<char>((u >> (8 * i)) & 0xFF));
@@ -80,19 +94,25 @@ std::string DwordBytes(uint32_t u) {
 uint32_t DwordOf(const Node& n) {
   if (n.IsString()) {
     const std::string s = n.String();
-    std::string digits = s;
-    int base = 10;
+    std::string_view digits = s;
+    uint64_t base = 10;
     if (digits.size() > 2 && digits[0] == '0' && (digits[1] == 'x' || digits[1] == 'X')) {
-      digits = digits.substr(2);
+      digits.remove_prefix(2);
       base = 16;
     }
-    if (digits.empty() || !std::all_of(digits.begin(), digits.end(), [&](char c) {
-          return base == 16 ? std::isxdigit(static_cast<unsigned char>(c)) != 0
-                            : std::isdigit(static_cast<unsigned char>(c)) != 0;
-        }))
+    auto digit = [&](char c) -> int {
+      if (c >= '0' && c <= '9') return c - '0';
+      if (base == 16 && c >= 'a' && c <= 'f') return c - 'a' + 10;
+      if (base == 16 && c >= 'A' && c <= 'F') return c - 'A' + 10;
+      return -1;
+    };
+    if (digits.empty() || !std::all_of(digits.begin(), digits.end(), [&](char c) { return digit(c) >= 0; }))
       n.Fail("\"" + s + "\" is not a 32-bit number (write 4278190208 or \"0xff000080\")");
-    const unsigned long long v = std::stoull(digits.substr(0, 17), nullptr, base);
-    if (digits.size() > 16 || v > 0xFFFFFFFFull) n.Fail("\"" + s + "\" does not fit in 32 bits");
+    uint64_t v = 0;
+    for (char c : digits) {
+      v = v * base + static_cast<uint64_t>(digit(c));
+      if (v > 0xFFFFFFFFull) n.Fail("\"" + s + "\" does not fit in 32 bits");
+    }
     return static_cast<uint32_t>(v);
   }
   const int64_t v = n.Integer();
@@ -140,6 +160,22 @@ int DaysInMonth(int year, int month) {
   return month == 2 && leap ? 29 : kDays[month - 1];
 }
 
+// Key names as Windows takes them: parts between single backslashes, of
+// printable characters (no line break, which REGEDIT4 cannot write).
+void CheckKeyName(const Node& registry, const std::string& fullKey, std::string_view path) {
+  size_t start = 0;
+  for (;;) {
+    const size_t end = std::min(path.find('\\', start), path.size());
+    if (end == start) registry.FailKey(fullKey, "a registry key has an empty part (\"\\\\\" twice, or at an end)");
+    if (end - start > kMaxKeyPart)
+      registry.FailKey(fullKey, "a part of a registry key is longer than " + std::to_string(kMaxKeyPart) + " characters");
+    if (end == path.size()) break;
+    start = end + 1;
+  }
+  if (std::any_of(path.begin(), path.end(), [](char c) { return static_cast<unsigned char>(c) < 0x20; }))
+    registry.FailKey(fullKey, "a registry key holds a control character or a line break");
+}
+
 }  // namespace
 
 std::vector<RegistryEntry> ParseRegistry(const Node& node) {
@@ -150,12 +186,15 @@ std::vector<RegistryEntry> ParseRegistry(const Node& node) {
     if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
       node.FailKey(fullKey,
                    "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+    CheckKeyName(node, fullKey, fullKey.substr(slash + 1));
     values.ExpectObject("an object of values");
     RegistryEntry keyOnly;
     keyOnly.root = *root;
     keyOnly.key = fullKey.substr(slash + 1);
     out.push_back(keyOnly);
     for (const auto& [name, value] : values.Members()) {
+      if (name.find_first_of(std::string_view("\r\n\0", 3)) != std::string::npos)
+        values.FailKey(name, "a value name holds a line break or a NUL, which the registry file cannot hold");
       RegistryEntry e = keyOnly;
       e.name = name == "@" ? "" : name;
       e.value = RegistryValueOf(value);
@@ -195,6 +234,7 @@ ClockSetting ParseClock(const Node& node) {
   if (auto st = node.Find("step")) {
     c.step = st->Number();
     if (*c.step < 0) st->Fail("the clock cannot step backwards");
+    if (*c.step > 86400) st->Fail("the clock steps at most one day (86400 seconds) at a time");
   }
   return c;
 }
@@ -219,8 +259,15 @@ void CheckValue(const Node& n, const ModelDef& model, const CompanionDef* owner,
     if (v < -32768 || v > 32767) inner.Fail("number out of the 16-bit range");
   } else if (form == "i4")
     inner.Int32();
-  else if (form == "r4" || form == "r8" || form == "date")
+  else if (form == "r4") {
+    if (std::abs(inner.Number()) > std::numeric_limits<float>::max()) inner.Fail("number out of the Single range");
+  } else if (form == "r8")
     inner.Number();
+  else if (form == "date") {
+    // 100-01-01 to the last moment of 9999-12-31, as a Date can hold.
+    const double d = inner.Number();
+    if (d < -657434.0 || d >= 2958466.0) inner.Fail("a date lies from -657434 (100-01-01) to 2958465.99 (9999-12-31)");
+  }
   else if (form == "bool")
     inner.Bool();
   else if (form == "null" || form == "nothing") {
@@ -253,9 +300,7 @@ class ModelReader {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
                       "resources", "resourceComponent", "model"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
-    if (auto n = root_.Find("files")) ReadFiles(*n);
-    if (auto n = root_.Find("folders"))
-      for (const Node& f : n->Elements()) m_.folders.push_back(Path(f));
+    ReadFilesAndFolders(root_.Find("files"), root_.Find("folders"));
     if (auto n = root_.Find("clock")) m_.clock = ParseClock(*n);
     if (auto n = root_.Find("application")) ReadApplication(*n);
     if (auto n = root_.Find("resources")) ReadResources(*n);
@@ -273,17 +318,24 @@ class ModelReader {
   }
 
  private:
-  static std::string Path(const Node& n) {
-    std::string p = n.String();
-    if (p.empty()) n.Fail("empty path");
-    return p;
-  }
-
-  void ReadFiles(const Node& n) {
-    for (const auto& [path, content] : n.Members()) {
-      if (path.empty()) n.FailKey(path, "empty path");
-      m_.files.emplace_back(path, content.String());
-    }
+  // Folders are made first, then files, as the run lays them out.
+  void ReadFilesAndFolders(const std::optional<Node>& files, const std::optional<Node>& folders) {
+    PathPlan plan;
+    if (folders)
+      for (const Node& f : folders->Elements()) {
+        const std::string path = f.String();
+        std::string fault = PathFault(path, false);
+        if (fault.empty()) fault = plan.MakeFolder(path);
+        if (!fault.empty()) f.Fail(fault);
+        m_.folders.push_back(path);
+      }
+    if (files)
+      for (const auto& [path, content] : files->Members()) {
+        std::string fault = PathFault(path, true);
+        if (fault.empty()) fault = plan.WriteFile(path);
+        if (!fault.empty()) files->FailKey(path, fault);
+        m_.files.emplace_back(path, content.String());
+      }
   }
 
   void ReadApplication(const Node& n) {
@@ -311,15 +363,16 @@ class ModelReader {
 
   void ReadResources(const Node& n) {
     for (const auto& [id, text] : n.Members()) {
-      size_t used = 0;
-      long v = 0;
-      try {
-        v = std::stol(id, &used);
-      } catch (...) {
-        used = 0;
+      // Digits with an optional minus; nothing else, not even blanks.
+      const std::string_view digits = std::string_view(id).substr(!id.empty() && id[0] == '-' ? 1 : 0);
+      int64_t v = 0;
+      bool ok = !digits.empty() && digits.size() <= 10;
+      for (char c : digits) {
+        ok = ok && c >= '0' && c <= '9';
+        if (ok) v = v * 10 + (c - '0');
       }
-      if (used == 0 || used != id.size() || v < std::numeric_limits<int32_t>::min() ||
-          v > std::numeric_limits<int32_t>::max())
+      if (id[0] == '-') v = -v;
+      if (!ok || v < std::numeric_limits<int32_t>::min() || v > std::numeric_limits<int32_t>::max())
         n.FailKey(id, "a resource is keyed by its string id, such as \"5030\"");
       m_.resources[static_cast<int32_t>(v)] = text.String();
     }
@@ -369,14 +422,24 @@ class ModelReader {
     }
   }
 
+  // Following nestedIn must end: a class cannot enclose itself. Each class
+  // is followed once; a chain that reaches one already followed stops.
   void CheckNesting() const {
-    for (const ElementDef& e : m_.elements) {
-      // Following nestedIn must end: a class cannot enclose itself.
-      std::set<std::string> seen{e.key};
-      for (const ElementDef* c = &e; !c->nestedIn.empty();) {
-        c = m_.FindElement(c->nestedIn);
-        if (!seen.insert(c->key).second) nestedNodes_.at(e.key).Fail("classes nested in a circle");
+    enum class Mark : unsigned char { None, OnWay, Done };
+    std::vector<Mark> marks(m_.elements.size(), Mark::None);
+    std::vector<size_t> way;
+    auto indexOf = [&](const ElementDef* e) { return static_cast<size_t>(e - m_.elements.data()); };
+    for (size_t start = 0; start < m_.elements.size(); ++start) {
+      way.clear();
+      for (size_t at = start; marks[at] == Mark::None;) {
+        marks[at] = Mark::OnWay;
+        way.push_back(at);
+        const ElementDef& c = m_.elements[at];
+        if (c.nestedIn.empty()) break;
+        at = indexOf(m_.FindElement(c.nestedIn));
+        if (marks[at] == Mark::OnWay) nestedNodes_.at(m_.elements[start].key).Fail("classes nested in a circle");
       }
+      for (size_t i : way) marks[i] = Mark::Done;
     }
   }
 
@@ -463,7 +526,7 @@ class ModelReader {
 
     const std::string key = e.key;
     const size_t index = m_.elements.size();
-    m_.elements.push_back(std::move(e));
+    m_.AddElement(std::move(e));
     for (const char* list : {"attributes", "operations"}) {
       std::optional<Node> members = n.Find(list);
       if (!members) continue;
@@ -487,7 +550,7 @@ class ModelReader {
       def.name = a.Member("name").String();
       const int k = ++seen[def.name];
       def.id = k == 1 ? def.name : def.name + "#" + std::to_string(k);
-      m_.addins.push_back(std::move(def));
+      m_.AddAddIn(std::move(def));
     }
     for (size_t i = 0; i < list.size(); ++i) ReadAddIn(list[i], m_.addins[i]);
   }

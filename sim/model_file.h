@@ -11,6 +11,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "platform/platform.h"
@@ -117,7 +118,7 @@ struct ElementDef {
 };
 
 struct ModelDef {
-  std::vector<RegistryEntry> registry;
+  std::vector<RegistryEntry> registry;  // keys and value names as REGEDIT4 can write them
   std::vector<std::pair<std::string, std::string>> files;
   std::vector<std::string> folders;
   ClockSetting clock;
@@ -127,11 +128,20 @@ struct ModelDef {
   std::map<int32_t, std::string> resources;
   bool resourceRegistered = true;
   Properties modelProperties;
-  std::vector<ElementDef> elements;
+  std::vector<ElementDef> elements;  // added through AddElement, which keeps them findable
   std::vector<std::string> selection;
 
   const ElementDef* FindElement(std::string_view key) const;
   const AddInDef* FindAddIn(std::string_view id) const;
+  // Appends an element under its key; false, and nothing added, when the
+  // key is taken.
+  bool AddElement(ElementDef element);
+  // Appends an add-in under its id, which must be new.
+  void AddAddIn(AddInDef addin);
+
+ private:
+  std::unordered_map<std::string, size_t> elementIndex_;
+  std::unordered_map<std::string, size_t> addinIndex_;
 };
 
 // The element kinds the simulated host knows, as IdentifyClass names them.

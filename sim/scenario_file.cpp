@@ -4,6 +4,7 @@
 
 #include "addin/api_members.h"
 #include "automation/vb_strings.h"
+#include "sim/windows_path.h"
 
 namespace kpx::sim {
 
@@ -69,11 +70,17 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   std::vector<Node> actions = root.Member("actions").Elements();
   s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create");
   bool alive = s.implicitCreate;
+  const std::vector<int> lines = source.ElementLines("/actions");
+  // The files and folders as the steps meet them, after the model's.
+  PathPlan plan;
+  for (const std::string& folder : model.folders) plan.MakeFolder(folder);
+  for (const auto& [path, content] : model.files) plan.WriteFile(path);
 
-  for (const Node& n : actions) {
+  for (size_t i = 0; i < actions.size(); ++i) {
+    const Node& n = actions[i];
     n.ExpectObject("an action");
     Action a;
-    a.line = n.line();
+    a.line = i < lines.size() ? lines[i] : 0;
     a.raw = n.json();
     std::string which;
     for (const auto& [key, value] : n.Members()) {
@@ -120,7 +127,9 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       } else {
         a.type = Action::Type::SetFile;
         for (const auto& [path, content] : body.Members()) {
-          if (path.empty()) body.FailKey(path, "empty path");
+          std::string fault = PathFault(path, true);
+          if (fault.empty()) fault = content.IsNull() ? plan.RemoveFile(path) : plan.WriteFile(path);
+          if (!fault.empty()) body.FailKey(path, fault);
           a.files.emplace_back(path, content.IsNull() ? std::nullopt : std::optional<std::string>(content.String()));
         }
       }

@@ -1,5 +1,7 @@
 #include "sim/simulation.h"
 
+#include <stdexcept>
+
 #include "automation/error_styles.h"
 
 namespace kpx::sim {
@@ -29,16 +31,31 @@ Simulation::~Simulation() {
 void Simulation::Prepare() {
   if (prepared_) return;
   prepared_ = true;
-  SeedRegistry(env_.registry, model_.registry);
+  SeedRegistry(model_.registry);
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
   for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);
   clock_.Set(model_.clock);
 }
 
+void Simulation::SeedRegistry(const std::vector<RegistryEntry>& entries) {
+  if (env_.batchRegistry)
+    env_.batchRegistry([&] { kpx::sim::SeedRegistry(env_.registry, entries); });
+  else
+    kpx::sim::SeedRegistry(env_.registry, entries);
+}
+
 void Simulation::Run(const Scenario& scenario) {
+  auto stepDone = [this] {
+    log_.Flush();
+    if (log_.broken()) throw std::runtime_error("the output cannot be written");
+  };
   Prepare();
   if (scenario.implicitCreate) Create();
-  for (const Action& action : scenario.actions) Apply(action);
+  stepDone();
+  for (const Action& action : scenario.actions) {
+    Apply(action);
+    stepDone();
+  }
   if (api_) Release(true);
   if (!ui_.pendingAnswers().empty())
     log_.Add({{"ev", "unused-answers"},
@@ -73,6 +90,12 @@ void Simulation::Apply(const Action& a) {
     ev[key] = EventJson::parse(a.raw.at(key).dump());
     log_.Add(std::move(ev));
   };
+  // What the world refused, after the step as written.
+  std::vector<std::string> refused;
+  auto logFailures = [&](const char* action) {
+    for (const std::string& reason : refused)
+      log_.Add({{"ev", "world-failed"}, {"action", action}, {"line", a.line}, {"reason", reason}});
+  };
   switch (a.type) {
     case Action::Type::Call:
       Call(a);
@@ -96,17 +119,27 @@ void Simulation::Apply(const Action& a) {
       logWorld("clock");
       break;
     case Action::Type::SetRegistry:
-      SeedRegistry(env_.registry, a.registry);
+      try {
+        SeedRegistry(a.registry);
+      } catch (const WorldError& e) {
+        refused.push_back(e.what());
+      }
       logWorld("setRegistry");
+      logFailures("setRegistry");
       break;
     case Action::Type::SetFile:
       for (const auto& [path, content] : a.files) {
-        if (content)
-          env_.seeder.WriteFile(path, *content);
-        else
-          env_.seeder.RemoveFile(path);
+        try {
+          if (content)
+            env_.seeder.WriteFile(path, *content);
+          else
+            env_.seeder.RemoveFile(path);
+        } catch (const WorldError& e) {
+          refused.push_back(e.what());
+        }
       }
       logWorld("setFile");
+      logFailures("setFile");
       break;
   }
 }
