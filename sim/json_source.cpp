@@ -13,20 +13,6 @@ InputError::InputError(std::string file, int line, std::string message)
       line_(line),
       message_(std::move(message)) {}
 
-std::string PointerAppend(const std::string& pointer, std::string_view token) {
-  std::string out = pointer;
-  out += '/';
-  for (char c : token) {
-    if (c == '~')
-      out += "~0";
-    else if (c == '/')
-      out += "~1";
-    else
-      out += c;
-  }
-  return out;
-}
-
 namespace {
 
 // Builds the document from the parser's events. Members are appended as
@@ -405,30 +391,72 @@ std::optional<JsonSource::Route> JsonSource::RouteOf(const std::string& pointer)
   return route;
 }
 
+std::optional<JsonSource::Route> JsonSource::RouteTo(const InputJson* value) const {
+  if (value == &root_) return Route{};
+  struct Level {
+    const InputJson* value;
+    size_t next;  // the child to look at next
+  };
+  std::vector<Level> stack{{&root_, 0}};
+  while (!stack.empty()) {
+    Level& top = stack.back();
+    const InputJson& v = *top.value;
+    const size_t count = v.is_object() || v.is_array() ? v.size() : 0;
+    if (top.next >= count) {
+      stack.pop_back();
+      continue;
+    }
+    const size_t i = top.next++;
+    const InputJson* child = v.is_object() ? &(v.get_ref<const InputJson::object_t&>().begin() + static_cast<std::ptrdiff_t>(i))->second
+                                           : &v.get_ref<const InputJson::array_t&>()[i];
+    if (child == value) {
+      Route route;
+      for (const Level& level : stack) route.push_back(level.next - 1);
+      return route;
+    }
+    if (child->is_object() || child->is_array()) stack.push_back({child, 0});
+  }
+  return std::nullopt;
+}
+
+int JsonSource::LineAt(const Route& route, bool key) const {
+  TextWalker walker(text_);
+  size_t keyAt = std::string::npos;
+  for (size_t place : route) {
+    keyAt = std::string::npos;
+    if (!walker.Enter(place, &keyAt)) return 0;
+  }
+  return LineCounter(text_).At(key && keyAt != std::string::npos ? keyAt : walker.at());
+}
+
 int JsonSource::LineOf(const std::string& pointer) const {
   std::optional<Route> route = RouteOf(pointer);
-  if (!route) return 0;
-  TextWalker walker(text_);
-  for (size_t place : *route)
-    if (!walker.Enter(place, nullptr)) return 0;
-  return LineCounter(text_).At(walker.at());
+  return route ? LineAt(*route, false) : 0;
 }
 
 int JsonSource::KeyLineOf(const std::string& pointer) const {
   std::optional<Route> route = RouteOf(pointer);
-  if (!route) return 0;
-  TextWalker walker(text_);
-  size_t keyAt = std::string::npos;
-  for (size_t i = 0; i < route->size(); ++i) {
-    keyAt = std::string::npos;
-    if (!walker.Enter((*route)[i], &keyAt)) return 0;
-  }
-  return LineCounter(text_).At(keyAt != std::string::npos ? keyAt : walker.at());
+  return route ? LineAt(*route, true) : 0;
 }
 
-std::vector<int> JsonSource::ElementLines(const std::string& pointer) const {
+int JsonSource::LineOfValue(const InputJson& value) const {
+  std::optional<Route> route = RouteTo(&value);
+  return route ? LineAt(*route, false) : 0;
+}
+
+int JsonSource::KeyLineOfValue(const InputJson& object, std::string_view key) const {
+  std::optional<Route> route = RouteTo(&object);
+  if (!route || !object.is_object()) return 0;
+  const InputJson::object_t& members = object.get_ref<const InputJson::object_t&>();
+  auto it = std::find_if(members.begin(), members.end(), [&](const auto& m) { return m.first == key; });
+  if (it == members.end()) return LineAt(*route, false);
+  route->push_back(static_cast<size_t>(it - members.begin()));
+  return LineAt(*route, true);
+}
+
+std::vector<int> JsonSource::ElementLines(const InputJson& list) const {
   std::vector<int> lines;
-  std::optional<Route> route = RouteOf(pointer);
+  std::optional<Route> route = RouteTo(&list);
   if (!route) return lines;
   TextWalker walker(text_);
   for (size_t place : *route)
@@ -443,7 +471,7 @@ std::vector<int> JsonSource::ElementLines(const std::string& pointer) const {
 void Node::Fail(const std::string& message) const { throw InputError(source_->name(), line(), message); }
 
 void Node::FailKey(std::string_view key, const std::string& message) const {
-  throw InputError(source_->name(), source_->KeyLineOf(PointerAppend(pointer_, key)), message);
+  throw InputError(source_->name(), source_->KeyLineOfValue(*value_, key), message);
 }
 
 void Node::ExpectObject(std::string_view what) const {
@@ -478,22 +506,22 @@ std::optional<Node> Node::Find(std::string_view key) const {
   ExpectObject();
   auto it = value_->find(std::string(key));
   if (it == value_->end()) return std::nullopt;
-  return Node(*source_, *it, PointerAppend(pointer_, key));
+  return Node(*source_, *it);
 }
 
 std::vector<std::pair<std::string, Node>> Node::Members() const {
   ExpectObject();
   std::vector<std::pair<std::string, Node>> out;
   for (auto it = value_->begin(); it != value_->end(); ++it)
-    out.emplace_back(it.key(), Node(*source_, it.value(), PointerAppend(pointer_, it.key())));
+    out.emplace_back(it.key(), Node(*source_, it.value()));
   return out;
 }
 
 std::vector<Node> Node::Elements() const {
   ExpectArray();
   std::vector<Node> out;
-  for (size_t i = 0; i < value_->size(); ++i)
-    out.emplace_back(*source_, (*value_)[i], pointer_ + "/" + std::to_string(i));
+  out.reserve(value_->size());
+  for (const InputJson& element : *value_) out.emplace_back(*source_, element);
   return out;
 }
 

@@ -58,34 +58,36 @@ class JsonSource {
   // The line of the key that names the member at `pointer`; its value's line
   // for array elements and the root.
   int KeyLineOf(const std::string& pointer) const;
-  // The lines of the elements of the list at `pointer`, found in one walk.
-  std::vector<int> ElementLines(const std::string& pointer) const;
+  // The same for a value of this document, known by its place in memory.
+  int LineOfValue(const InputJson& value) const;
+  // The line of the key `key` of the object `object` of this document.
+  int KeyLineOfValue(const InputJson& object, std::string_view key) const;
+  // The lines of the elements of the list `list`, found in one walk.
+  std::vector<int> ElementLines(const InputJson& list) const;
 
  private:
   // Where a value lies: at each level, the place of the member or element
   // among its siblings.
   using Route = std::vector<size_t>;
   std::optional<Route> RouteOf(const std::string& pointer) const;
+  std::optional<Route> RouteTo(const InputJson* value) const;
+  // The line where the value at `route` starts, or with `key` its key's.
+  int LineAt(const Route& route, bool key) const;
   std::string name_;
   std::string text_;
   InputJson root_;
 };
 
-// Appends one reference token to a JSON pointer, escaped.
-std::string PointerAppend(const std::string& pointer, std::string_view token);
-
 // A value inside a JsonSource, for reading it with checks that name the
-// right line when they fail.
+// right line when they fail. Small: a large file makes millions.
 class Node {
  public:
-  Node(const JsonSource& source, const InputJson& value, std::string pointer)
-      : source_(&source), value_(&value), pointer_(std::move(pointer)) {}
-  static Node Root(const JsonSource& source) { return Node(source, source.root(), ""); }
+  Node(const JsonSource& source, const InputJson& value) : source_(&source), value_(&value) {}
+  static Node Root(const JsonSource& source) { return Node(source, source.root()); }
 
   const InputJson& json() const { return *value_; }
-  const std::string& pointer() const { return pointer_; }
   const JsonSource& source() const { return *source_; }
-  int line() const { return source_->LineOf(pointer_); }
+  int line() const { return source_->LineOfValue(*value_); }
 
   [[noreturn]] void Fail(const std::string& message) const;
   // A fault of the member `key` itself (an unknown or misplaced key).
@@ -122,7 +124,6 @@ class Node {
  private:
   const JsonSource* source_;
   const InputJson* value_;
-  std::string pointer_;
 };
 
 }  // namespace kpx::sim

@@ -22,14 +22,24 @@ const MemberDef* CompanionDef::FindMember(std::string_view name) const {
   return it == members.end() ? nullptr : &it->second;
 }
 
+std::optional<size_t> ModelDef::PlaceOf(std::string_view key) const {
+  auto it = elementIndex_.find(key);
+  return it == elementIndex_.end() ? std::nullopt : std::optional<size_t>(it->second);
+}
+
 const ElementDef* ModelDef::FindElement(std::string_view key) const {
-  auto it = elementIndex_.find(std::string(key));
-  return it == elementIndex_.end() ? nullptr : &elements[it->second];
+  std::optional<size_t> place = PlaceOf(key);
+  return place ? &elements[*place] : nullptr;
 }
 
 const AddInDef* ModelDef::FindAddIn(std::string_view id) const {
-  auto it = addinIndex_.find(std::string(id));
+  auto it = addinIndex_.find(id);
   return it == addinIndex_.end() ? nullptr : &addins[it->second];
+}
+
+void ModelDef::ReserveElements(size_t count) {
+  elements.reserve(count);
+  elementIndex_.reserve(count);
 }
 
 bool ModelDef::AddElement(ElementDef element) {
@@ -392,8 +402,11 @@ class ModelReader {
   void ReadModel(const Node& n) {
     n.ExpectKeys({"properties", "elements", "selection"});
     if (auto p = n.Find("properties")) m_.modelProperties = ReadProperties(*p);
-    if (auto e = n.Find("elements"))
-      for (const Node& element : e->Elements()) ReadElement(element, "");
+    if (auto e = n.Find("elements")) {
+      const std::vector<Node> elements = e->Elements();
+      m_.ReserveElements(CountElements(elements));
+      for (const Node& element : elements) ReadElement(element, "");
+    }
     for (const Reference& r : references_) CheckReference(r);
     CheckNesting();
     if (auto s = n.Find("selection"))
@@ -403,23 +416,30 @@ class ModelReader {
       }
   }
 
-  // A name that must denote an element of one of `kinds` (any kind when empty).
+  // A name that must denote an element of `kind` (any kind when empty).
   struct Reference {
     Node node;
-    std::vector<std::string_view> kinds;
+    std::string_view kind;
   };
 
-  void Refer(const Node& node, std::vector<std::string_view> kinds) { references_.push_back({node, std::move(kinds)}); }
+  // Elements with their attributes and operations, to make room for once.
+  static size_t CountElements(const std::vector<Node>& elements) {
+    size_t count = elements.size();
+    for (const Node& e : elements)
+      if (e.IsObject())
+        for (const char* list : {"attributes", "operations"})
+          if (auto it = e.json().find(list); it != e.json().end() && it->is_array()) count += it->size();
+    return count;
+  }
+
+  void Refer(const Node& node, std::string_view kind) { references_.push_back({node, kind}); }
 
   void CheckReference(const Reference& r) const {
-    const std::string name = r.node.String();
+    const std::string& name = r.node.json().is_string() ? r.node.json().get_ref<const std::string&>() : r.node.String();
     const ElementDef* e = m_.FindElement(name);
     if (!e) r.node.Fail("no element \"" + name + "\" in the model");
-    if (!r.kinds.empty() && std::find(r.kinds.begin(), r.kinds.end(), e->kind) == r.kinds.end()) {
-      std::string want;
-      for (std::string_view k : r.kinds) want += (want.empty() ? "" : " or ") + std::string(k);
-      r.node.Fail("\"" + name + "\" is a " + e->kind + ", not a " + want);
-    }
+    if (!r.kind.empty() && e->kind != r.kind)
+      r.node.Fail("\"" + name + "\" is a " + e->kind + ", not a " + std::string(r.kind));
   }
 
   // Following nestedIn must end: a class cannot enclose itself. Each class
@@ -428,7 +448,6 @@ class ModelReader {
     enum class Mark : unsigned char { None, OnWay, Done };
     std::vector<Mark> marks(m_.elements.size(), Mark::None);
     std::vector<size_t> way;
-    auto indexOf = [&](const ElementDef* e) { return static_cast<size_t>(e - m_.elements.data()); };
     for (size_t start = 0; start < m_.elements.size(); ++start) {
       way.clear();
       for (size_t at = start; marks[at] == Mark::None;) {
@@ -436,8 +455,8 @@ class ModelReader {
         way.push_back(at);
         const ElementDef& c = m_.elements[at];
         if (c.nestedIn.empty()) break;
-        at = indexOf(m_.FindElement(c.nestedIn));
-        if (marks[at] == Mark::OnWay) nestedNodes_.at(m_.elements[start].key).Fail("classes nested in a circle");
+        at = *m_.PlaceOf(c.nestedIn);
+        if (marks[at] == Mark::OnWay) nestedNodes_.at(start).Fail("classes nested in a circle");
       }
       for (size_t i : way) marks[i] = Mark::Done;
     }
@@ -480,7 +499,6 @@ class ModelReader {
     e.name = name.String();
     if (e.name.empty()) name.Fail("an element needs a name");
     e.key = owner.empty() ? e.name : owner + "." + e.name;
-    if (m_.FindElement(e.key)) name.Fail("a second element \"" + e.key + "\"");
     e.owner = owner;
     e.stereotype = n.StringOr("stereotype", "");
     e.displayName = n.StringOr("displayName", e.name);
@@ -489,13 +507,13 @@ class ModelReader {
 
     if (auto c = n.Find("components"))
       for (const Node& m : c->Elements()) {
-        Refer(m, {"Module"});
+        Refer(m, "Module");
         e.components.push_back(m.String());
       }
     if (auto nest = n.Find("nestedIn")) {
-      Refer(*nest, {"Class"});
+      Refer(*nest, "Class");
       e.nestedIn = nest->String();
-      nestedNodes_.emplace(e.key, *nest);
+      nestedNodes_.emplace(m_.elements.size(), *nest);
     }
     e.classKind = n.StringOr("classKind", e.classKind);
     if (auto p = n.Find("package")) {
@@ -505,7 +523,7 @@ class ModelReader {
     }
     for (const char* end : {"client", "supplier"})
       if (auto r = n.Find(end)) {
-        Refer(*r, {});
+        Refer(*r, "");
         (std::string_view(end) == "client" ? e.client : e.supplier) = r->String();
       }
     e.relationText = n.StringOr("relationText", e.client + " -> " + e.supplier);
@@ -515,18 +533,18 @@ class ModelReader {
     }
     for (const char* role : {"role1", "role2"})
       if (auto r = n.Find(role)) {
-        Refer(*r, {"Role"});
+        Refer(*r, "Role");
         (std::string_view(role) == "role1" ? e.role1 : e.role2) = r->String();
       }
     if (auto c = n.Find("class")) {
-      Refer(*c, {"Class"});
+      Refer(*c, "Class");
       e.roleClass = c->String();
     }
     e.navigable = n.BoolOr("navigable", false);
 
     const std::string key = e.key;
     const size_t index = m_.elements.size();
-    m_.AddElement(std::move(e));
+    if (!m_.AddElement(std::move(e))) name.Fail("a second element \"" + key + "\"");
     for (const char* list : {"attributes", "operations"}) {
       std::optional<Node> members = n.Find(list);
       if (!members) continue;
@@ -651,7 +669,7 @@ class ModelReader {
   Node root_;
   ModelDef m_;
   std::vector<Reference> references_;
-  std::map<std::string, Node> nestedNodes_;
+  std::unordered_map<size_t, Node> nestedNodes_;  // by the place of the element
   std::string kindForMembers_;
 };
 

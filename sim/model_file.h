@@ -132,16 +132,24 @@ struct ModelDef {
   std::vector<std::string> selection;
 
   const ElementDef* FindElement(std::string_view key) const;
+  // Where the element is in `elements`.
+  std::optional<size_t> PlaceOf(std::string_view key) const;
   const AddInDef* FindAddIn(std::string_view id) const;
   // Appends an element under its key; false, and nothing added, when the
   // key is taken.
   bool AddElement(ElementDef element);
+  void ReserveElements(size_t count);
   // Appends an add-in under its id, which must be new.
   void AddAddIn(AddInDef addin);
 
  private:
-  std::unordered_map<std::string, size_t> elementIndex_;
-  std::unordered_map<std::string, size_t> addinIndex_;
+  struct Hash {
+    using is_transparent = void;
+    size_t operator()(std::string_view s) const { return std::hash<std::string_view>{}(s); }
+  };
+  using Index = std::unordered_map<std::string, size_t, Hash, std::equal_to<>>;
+  Index elementIndex_;
+  Index addinIndex_;
 };
 
 // The element kinds the simulated host knows, as IdentifyClass names them.

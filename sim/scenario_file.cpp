@@ -67,10 +67,11 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   const Node root = Node::Root(source);
   root.ExpectKeys({"comment", "model", "actions"});
   Scenario s;
-  std::vector<Node> actions = root.Member("actions").Elements();
+  const Node list = root.Member("actions");
+  std::vector<Node> actions = list.Elements();
   s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create");
   bool alive = s.implicitCreate;
-  const std::vector<int> lines = source.ElementLines("/actions");
+  const std::vector<int> lines = source.ElementLines(list.json());
   // The files and folders as the steps meet them, after the model's.
   PathPlan plan;
   for (const std::string& folder : model.folders) plan.MakeFolder(folder);

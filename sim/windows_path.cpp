@@ -41,6 +41,15 @@ bool IsDeviceName(std::string_view name) {
          base[3] <= '9';
 }
 
+// "text" with its quotes. Built by appending: GCC 12 warns falsely
+// (-Wrestrict) about a literal put before a string by operator+.
+std::string Quoted(std::string_view text) {
+  std::string out = "\"";
+  out.append(text);
+  out += '"';
+  return out;
+}
+
 }  // namespace
 
 std::vector<std::string> FoldedPathParts(std::string_view path) {
@@ -101,7 +110,7 @@ std::string PathPlan::MakeParents(const std::vector<std::string>& parts, size_t 
   for (size_t n = RootParts(parts) + 1; n <= count; ++n) {
     auto [it, added] = places_.try_emplace(Joined(parts, n), Place{Kind::Folder, std::string(path)});
     if (!added && it->second.kind == Kind::File)
-      return "\"" + it->second.spelling + "\" is a file, so \"" + std::string(path) + "\" cannot be made in it";
+      return Quoted(it->second.spelling) + " is a file, so " + Quoted(path) + " cannot be made in it";
   }
   return {};
 }
@@ -116,7 +125,7 @@ std::string PathPlan::WriteFile(std::string_view path) {
   if (std::string fault = MakeParents(parts, parts.size() - 1, path); !fault.empty()) return fault;
   auto [it, added] = places_.try_emplace(Joined(parts, parts.size()), Place{Kind::File, std::string(path)});
   if (!added && it->second.kind == Kind::Folder)
-    return "\"" + std::string(path) + "\" is a folder (made for \"" + it->second.spelling + "\"), not a file";
+    return Quoted(path) + " is a folder (made for " + Quoted(it->second.spelling) + "), not a file";
   return {};
 }
 
@@ -125,7 +134,7 @@ std::string PathPlan::RemoveFile(std::string_view path) {
   auto it = places_.find(Joined(parts, parts.size()));
   if (it == places_.end()) return {};
   if (it->second.kind == Kind::Folder)
-    return "\"" + std::string(path) + "\" is a folder (made for \"" + it->second.spelling + "\"); only files are deleted";
+    return Quoted(path) + " is a folder (made for " + Quoted(it->second.spelling) + "); only files are deleted";
   places_.erase(it);
   return {};
 }

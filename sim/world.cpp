@@ -40,8 +40,8 @@ World::~World() = default;
 ObjectPtr World::application() const { return application_; }
 
 std::shared_ptr<ElementObject> World::FindElement(std::string_view key) const {
-  const ElementDef* e = def_.FindElement(key);
-  return e ? elements_[static_cast<size_t>(e - def_.elements.data())] : nullptr;
+  const std::optional<size_t> place = def_.PlaceOf(key);
+  return place ? elements_[*place] : nullptr;
 }
 
 std::shared_ptr<AddInObject> World::FindAddIn(std::string_view id) const {
