@@ -15,12 +15,13 @@ InputError::InputError(std::string file, int line, std::string message)
 
 namespace {
 
-// Builds the document from the parser's events. Members are appended as
-// they come: an ordered object's own insert searches its members first,
-// which makes a large object cost the square of its size. Duplicate keys
-// are noted here instead (the first one, by where it lies) and reported
-// once the whole text has parsed, so that a syntax error anywhere is
-// reported first.
+// Builds the document from the parser's events. An object's members are
+// gathered apart and moved into it when it closes: an ordered object
+// searches its members on each insert (the square of its size), and its
+// members, whose keys are const, are copied, subtrees and all, each time
+// it grows. Duplicate keys are noted here instead (the first one, by where
+// it lies) and reported once the whole text has parsed, so that a syntax
+// error anywhere is reported first.
 class DocumentBuilder {
  public:
   using number_integer_t = InputJson::number_integer_t;
@@ -40,25 +41,34 @@ class DocumentBuilder {
   bool binary(binary_t& v) { return Put(InputJson::binary(std::move(v))) != nullptr; }
   bool start_object(std::size_t) { return Open(InputJson::object()); }
   bool start_array(std::size_t) { return Open(InputJson::array()); }
-  bool end_object() { return Close(); }
-  bool end_array() { return Close(); }
+  bool end_object() {
+    Frame& f = stack_.back();
+    InputJson::object_t& members = f.value->get_ref<InputJson::object_t&>();
+    members.reserve(f.members.size());
+    for (auto& [key, value] : f.members) members.emplace_back(std::move(key), std::move(value));
+    stack_.pop_back();
+    return true;
+  }
+  bool end_array() {
+    stack_.pop_back();
+    return true;
+  }
 
   bool key(string_t& key) {
     Frame& f = stack_.back();
-    InputJson::object_t& members = f.value->get_ref<InputJson::object_t&>();
     // Small objects are searched; large ones keep a set of their keys.
     constexpr size_t kSearched = 16;
     bool seen = false;
-    if (members.size() < kSearched) {
-      seen = std::any_of(members.begin(), members.end(), [&](const auto& m) { return m.first == key; });
+    if (f.members.size() < kSearched) {
+      seen = std::any_of(f.members.begin(), f.members.end(), [&](const auto& m) { return m.first == key; });
     } else {
       if (f.keys.empty())
-        for (const auto& m : members) f.keys.insert(m.first);
+        for (const auto& m : f.members) f.keys.insert(m.first);
       seen = !f.keys.insert(key).second;
     }
     if (seen && !duplicate_) {
       duplicate_ = RouteHere();
-      duplicate_->push_back(members.size());
+      duplicate_->push_back(f.members.size());
       duplicateKey_ = key;
     }
     key_ = std::move(key);
@@ -84,41 +94,39 @@ class DocumentBuilder {
  private:
   struct Frame {
     InputJson* value;
-    size_t place;  // among its parent's members or elements
+    size_t place;                                          // among its parent's members or elements
+    std::vector<std::pair<std::string, InputJson>> members;  // of an object, until it closes
     std::unordered_set<std::string> keys;
   };
 
-  // Stores a value where the parser is; returns where it went.
+  // Stores a value where the parser is; returns where it went. A container
+  // is added to only while it is innermost, so the places of the open ones
+  // (kept on the stack) stay valid.
   InputJson* Put(InputJson&& v) {
     if (stack_.empty()) {
       root_ = std::move(v);
       return &root_;
     }
-    InputJson& parent = *stack_.back().value;
-    if (parent.is_array()) {
-      InputJson::array_t& elements = parent.get_ref<InputJson::array_t&>();
+    Frame& parent = stack_.back();
+    if (parent.value->is_array()) {
+      InputJson::array_t& elements = parent.value->get_ref<InputJson::array_t&>();
       elements.push_back(std::move(v));
       return &elements.back();
     }
-    InputJson::object_t& members = parent.get_ref<InputJson::object_t&>();
-    members.emplace_back(std::move(key_), std::move(v));
-    return &members.back().second;
+    parent.members.emplace_back(std::move(key_), std::move(v));
+    return &parent.members.back().second;
   }
 
-  // A container is appended to only while it is innermost, so the
-  // pointers kept on the stack stay valid.
   bool Open(InputJson&& container) {
     if (stack_.size() >= JsonSource::kMaxDepth) {
       tooDeep_ = true;
       return false;
     }
-    const size_t place = stack_.empty() ? 0 : stack_.back().value->size();
-    stack_.push_back({Put(std::move(container)), place, {}});
-    return true;
-  }
-
-  bool Close() {
-    stack_.pop_back();
+    const size_t place = stack_.empty() ? 0
+                         : stack_.back().value->is_array() ? stack_.back().value->size()
+                                                           : stack_.back().members.size();
+    InputJson* at = Put(std::move(container));
+    stack_.push_back({at, place, {}, {}});
     return true;
   }
 
@@ -504,9 +512,9 @@ Node Node::Member(std::string_view key) const {
 
 std::optional<Node> Node::Find(std::string_view key) const {
   ExpectObject();
-  auto it = value_->find(std::string(key));
-  if (it == value_->end()) return std::nullopt;
-  return Node(*source_, *it);
+  for (const auto& [name, value] : value_->get_ref<const InputJson::object_t&>())
+    if (name == key) return Node(*source_, value);
+  return std::nullopt;
 }
 
 std::vector<std::pair<std::string, Node>> Node::Members() const {

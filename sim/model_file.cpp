@@ -42,7 +42,7 @@ void ModelDef::ReserveElements(size_t count) {
   elementIndex_.reserve(count);
 }
 
-bool ModelDef::AddElement(ElementDef element) {
+bool ModelDef::AddElement(ElementDef&& element) {
   if (!elementIndex_.emplace(element.key, elements.size()).second) return false;
   elements.push_back(std::move(element));
   return true;

@@ -137,7 +137,7 @@ struct ModelDef {
   const AddInDef* FindAddIn(std::string_view id) const;
   // Appends an element under its key; false, and nothing added, when the
   // key is taken.
-  bool AddElement(ElementDef element);
+  bool AddElement(ElementDef&& element);
   void ReserveElements(size_t count);
   // Appends an add-in under its id, which must be new.
   void AddAddIn(AddInDef addin);

@@ -35,6 +35,7 @@ void ReadCall(const Node& n, const ModelDef& model, Action& a) {
   a.member = member->name;
   a.kind = member->kind;
   if (auto k = n.Find("kind")) {
+    a.kindGiven = true;
     const std::string kind = k->String();
     if (kind == "method")
       a.kind = CallKind::Method;
@@ -82,7 +83,6 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
     n.ExpectObject("an action");
     Action a;
     a.line = i < lines.size() ? lines[i] : 0;
-    a.raw = n.json();
     std::string which;
     for (const auto& [key, value] : n.Members()) {
       if (key == "comment" || key == "args" || key == "kind") continue;
@@ -102,6 +102,7 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       if (!alive) body.Fail("the add-in object was released: add {\"create\": true} before calling it again");
     } else {
       n.ExpectKeys({"comment", std::string_view(which)});
+      a.raw = n.json();
       if (which == "select") {
         a.type = Action::Type::Select;
         for (const Node& item : body.Elements()) {

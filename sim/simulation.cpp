@@ -167,7 +167,7 @@ void Simulation::Call(const Action& a) {
     }
   }
   EventJson call{{"ev", "call"}, {"member", a.member}, {"args", std::move(shown)}};
-  if (a.raw.contains("kind")) call["kind"] = a.kind == CallKind::PropertyGet ? "get" : "method";
+  if (a.kindGiven) call["kind"] = a.kind == CallKind::PropertyGet ? "get" : "method";
   log_.Add(std::move(call));
 
   const uint64_t before = log_.hostCalls();
