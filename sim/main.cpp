@@ -216,8 +216,10 @@ int Run(const Options& o, SignalGuard& guard) {
   // Opened only now: a bad input leaves an earlier output as it was.
   std::ofstream file;
   if (o.out) {
+    std::error_code ec;
+    if (fs::is_directory(*o.out, ec)) throw InputError(*o.out, 0, "a folder: the output cannot be written there");
     file.open(*o.out, std::ios::binary | std::ios::trunc);
-    if (!file) throw std::runtime_error("cannot write " + *o.out);
+    if (!file) throw InputError(*o.out, 0, "the output cannot be written there");
   }
   std::ostream& out = o.out ? static_cast<std::ostream&>(file) : std::cout;
   std::unique_ptr<EventSink> sink;

@@ -48,9 +48,10 @@ bool ModelDef::AddElement(ElementDef&& element) {
   return true;
 }
 
-void ModelDef::AddAddIn(AddInDef addin) {
-  addinIndex_.emplace(addin.id, addins.size());
+bool ModelDef::AddAddIn(AddInDef&& addin) {
+  if (!addinIndex_.emplace(addin.id, addins.size()).second) return false;
   addins.push_back(std::move(addin));
+  return true;
 }
 
 const std::vector<std::string_view>& ElementKinds() {
@@ -239,6 +240,8 @@ ClockSetting ParseClock(const Node& node) {
         seconds += (s[i] - '0') * scale;
       }
     }
+    // Many decimals can round up to a whole day, which Timer never reads.
+    if (seconds >= 86400) tm->Fail("a time lies before 24:00:00");
     c.seconds = seconds;
   }
   if (auto st = node.Find("step")) {
@@ -565,10 +568,13 @@ class ModelReader {
     for (const Node& a : list) {
       a.ExpectObject("an add-in");
       AddInDef def;
-      def.name = a.Member("name").String();
+      const Node name = a.Member("name");
+      def.name = name.String();
       const int k = ++seen[def.name];
       def.id = k == 1 ? def.name : def.name + "#" + std::to_string(k);
-      m_.AddAddIn(std::move(def));
+      const std::string id = def.id;
+      if (!m_.AddAddIn(std::move(def)))
+        name.Fail("two add-ins are called \"" + id + "\" (the k-th add-in of a name is called name#k)");
     }
     for (size_t i = 0; i < list.size(); ++i) ReadAddIn(list[i], m_.addins[i]);
   }

@@ -139,8 +139,9 @@ struct ModelDef {
   // key is taken.
   bool AddElement(ElementDef&& element);
   void ReserveElements(size_t count);
-  // Appends an add-in under its id, which must be new.
-  void AddAddIn(AddInDef addin);
+  // Appends an add-in under its id; false, and nothing added, when the id
+  // is taken.
+  bool AddAddIn(AddInDef&& addin);
 
  private:
   struct Hash {

@@ -229,11 +229,26 @@ void Seeding(std::string_view windowsPath, const char* what, F change) {
   }
 }
 
+// Refuses a path below a file, in the same words on every system.
+void CheckFolders(std::string_view windowsPath, const std::filesystem::path& path, const char* what) {
+  for (std::filesystem::path up = path.parent_path(); !up.empty(); up = up.parent_path()) {
+    const std::filesystem::file_status status = std::filesystem::status(up);
+    if (std::filesystem::exists(status)) {
+      if (!std::filesystem::is_directory(status))
+        throw WorldError(std::string("cannot ") + what + " " + std::string(windowsPath) +
+                         ": a file lies where a folder must be");
+      return;
+    }
+    if (up == up.root_path()) return;
+  }
+}
+
 }  // namespace
 
 void FileSeeder::MakeFolder(std::string_view windowsPath) {
   Seeding(windowsPath, "make the folder", [&] {
     const std::filesystem::path path = hostPath_(windowsPath);
+    CheckFolders(windowsPath, path / "x", "make the folder");  // the folder itself too
     std::filesystem::create_directories(path);
   });
 }
@@ -241,6 +256,7 @@ void FileSeeder::MakeFolder(std::string_view windowsPath) {
 void FileSeeder::WriteFile(std::string_view windowsPath, std::string_view content) {
   Seeding(windowsPath, "write", [&] {
     const std::filesystem::path path = hostPath_(windowsPath);
+    CheckFolders(windowsPath, path, "write");
     if (path.has_parent_path()) std::filesystem::create_directories(path.parent_path());
     if (std::filesystem::is_directory(path))
       throw WorldError("cannot write " + std::string(windowsPath) + ": a folder of that name is in the way");
