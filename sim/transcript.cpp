@@ -212,23 +212,6 @@ void SpillList::Add(const std::string& text) {
   memory_.push_back(text);
 }
 
-template <typename F>
-void SpillList::ForEach(F each) const {
-  if (file_ && inFile_ > 0) {
-    std::fflush(file_);
-    std::rewind(file_);
-    uint64_t n = 0;
-    std::string s;
-    for (uint64_t i = 0; i < inFile_ && std::fread(&n, sizeof n, 1, file_) == 1; ++i) {
-      s.assign(n, '\0');
-      if (std::fread(s.data(), 1, n, file_) != n) break;
-      each(s);
-    }
-    std::fseek(file_, 0, SEEK_END);
-  }
-  for (const std::string& s : memory_) each(s);
-}
-
 TranscriptWriter::TranscriptWriter(std::ostream& out, const std::string& title) : out_(out) {
   out_ << title << "\n\n";
 }
