@@ -272,8 +272,11 @@ TEST(FileRegistry, ABatchWritesTheFileOnceAndATakenBackChangeLeavesNoTrace) {
   FileRegistry registry(file);
   registry.WriteOnce([&] {
     EXPECT_EQ(registry.CreateKey(RootKey::CurrentUser, "Software\\Bulk"), KeyDisposition::Created);
-    for (int i = 0; i < 100; ++i)
-      EXPECT_TRUE(registry.SetValue(RootKey::CurrentUser, "Software\\Bulk", "V" + std::to_string(i), Dword(i)));
+    for (int i = 0; i < 100; ++i) {
+      std::string name = "V";
+      name += std::to_string(i);
+      EXPECT_TRUE(registry.SetValue(RootKey::CurrentUser, "Software\\Bulk", name, Dword(i)));
+    }
     EXPECT_FALSE(registry.SetValue(RootKey::CurrentUser, "Software\\Missing", "x", Sz("y")));
     EXPECT_FALSE(fs::exists(file)) << "nothing is written before the batch ends";
   });
