@@ -11,11 +11,7 @@
 
 namespace kpx::sim {
 
-bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
-  return std::lexicographical_compare(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) {
-    return std::tolower(static_cast<unsigned char>(x)) < std::tolower(static_cast<unsigned char>(y));
-  });
-}
+bool NoCaseLess::operator()(std::string_view a, std::string_view b) const { return kpx::NoCaseLess()(a, b); }
 
 const MemberDef* CompanionDef::FindMember(std::string_view name) const {
   auto it = members.find(name);
