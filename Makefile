@@ -4,8 +4,10 @@ JOBS       ?= $(shell nproc 2>/dev/null || echo 2)
 NATIVE_DIR := $(BUILD)/native
 WIN64_DIR  := $(BUILD)/win-x64
 WIN32_DIR  := $(BUILD)/win-x86
+FUZZ_DIR   := $(BUILD)/fuzz
+FUZZ_SECONDS ?= 60
 
-.PHONY: all setup native windows wintest test demo bench clean
+.PHONY: all setup native windows wintest test demo bench fuzz clean
 
 all: native
 
@@ -40,6 +42,15 @@ bench:
 	cmake -S . -B $(BUILD)/bench -DCMAKE_BUILD_TYPE=Release
 	cmake --build $(BUILD)/bench -j $(JOBS) --target kpx-bench
 	$(BUILD)/bench/bench/kpx-bench
+
+# libFuzzer with clang, the libraries instrumented as well as the targets;
+# each target runs FUZZ_SECONDS, one after the other. `make fuzz
+# FUZZ_TARGETS=vb_numbers` runs only the ones named.
+fuzz:
+	@scripts/setup.sh native
+	CC=clang CXX=clang++ cmake -S . -B $(FUZZ_DIR) -DCMAKE_BUILD_TYPE=RelWithDebInfo -DKPX_FUZZ=ON
+	cmake --build $(FUZZ_DIR) -j $(JOBS) --target fuzz-all
+	FUZZ_SECONDS=$(FUZZ_SECONDS) scripts/fuzz.sh $(FUZZ_DIR) $(FUZZ_TARGETS)
 
 clean:
 	rm -rf $(BUILD)

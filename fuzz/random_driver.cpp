@@ -1,6 +1,7 @@
 // Drives a fuzz target without libFuzzer: the seed files first, then
 // pseudo-random mutations of them, for a fixed number of runs, so that the
 // same inputs run in every build.
+#include <algorithm>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -28,16 +29,27 @@ int main(int argc, char** argv) {
   for (const std::string& s : seeds) LLVMFuzzerTestOneInput(reinterpret_cast<const uint8_t*>(s.data()), s.size());
 
   std::mt19937 random(12345);
-  const std::string alphabet = "|,; \n\\\"=@[]-:abcXYZ0129#\r\t";
+  // Characters that mean something to one parser or another: separators,
+  // JSON's and REGEDIT4's punctuation, path parts, the pieces of numbers.
+  const std::string alphabet = "|,; \n\\\"=@[]{}-+.:/&HheEabcXYZ0129#\r\t";
   for (long i = 0; i < runs; ++i) {
     std::string input = seeds[random() % seeds.size()];
     const int edits = 1 + static_cast<int>(random() % 8);
     for (int e = 0; e < edits; ++e) {
       const size_t at = input.empty() ? 0 : random() % (input.size() + 1);
-      switch (random() % 3) {
+      switch (random() % 4) {
         case 0: input.insert(at, 1, alphabet[random() % alphabet.size()]); break;
         case 1: if (at < input.size()) input.erase(at, 1); break;
-        default: if (at < input.size()) input[at] = static_cast<char>(random() % 256); break;
+        case 2: if (at < input.size()) input[at] = static_cast<char>(random() % 256); break;
+        default: {
+          // A piece of some seed, so that whole tokens and structures move.
+          const std::string& from = seeds[random() % seeds.size()];
+          if (from.empty()) break;
+          const size_t start = random() % from.size();
+          const size_t length = 1 + random() % std::min<size_t>(16, from.size() - start);
+          input.insert(at, from, start, length);
+          break;
+        }
       }
     }
     LLVMFuzzerTestOneInput(reinterpret_cast<const uint8_t*>(input.data()), input.size());

@@ -37,6 +37,8 @@ CompanionObject::CompanionObject(World& world, std::shared_ptr<const CompanionDe
     names_.push_back(name);
   };
   for (const std::string& op : def_->operations) add(op);
+  for (const auto& [iid, members] : def_->interfaces)
+    for (const std::string& m : members) add(m);
   for (const auto& [name, member] : def_->members) add(name);
 }
 
@@ -61,13 +63,55 @@ DispId CompanionObject::IdOfOwnOperation(int position) {
   throw error;
 }
 
+namespace {
+
+// A companion seen through another of its interfaces: that interface's
+// members only, with the companion's own dispatch ids and answers.
+class CompanionInterface final : public SimObject {
+ public:
+  CompanionInterface(std::shared_ptr<CompanionObject> owner, std::string iid, const std::vector<std::string>& members)
+      : owner_(std::move(owner)), iid_(std::move(iid)), members_(members) {}
+  std::string label() const override { return owner_->label(); }
+
+  DispId IdOfName(std::string_view name) override {
+    for (const std::string& m : members_)
+      if (EqualsNoCase(m, name)) return owner_->IdOfName(m);
+    throw AutomationError(vberr::kNoSuchMember);
+  }
+  DispId IdOfOwnOperation(int position) override {
+    if (position < 1 || static_cast<size_t>(position) > members_.size()) throw AutomationError(vberr::kNoSuchMember);
+    return owner_->IdOfName(members_[static_cast<size_t>(position - 1)]);
+  }
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override {
+    return owner_->InvokeThrough(&iid_, id, kind, args);
+  }
+
+ private:
+  std::shared_ptr<CompanionObject> owner_;
+  std::string iid_;
+  const std::vector<std::string>& members_;
+};
+
+}  // namespace
+
+ObjectPtr CompanionObject::QueryInterface(std::string_view iid) {
+  auto it = def_->interfaces.find(iid);
+  if (it == def_->interfaces.end()) throw AutomationError(vberr::kTypeMismatch);
+  return std::make_shared<CompanionInterface>(shared_from_this(), it->first, it->second);
+}
+
 Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
+  return InvokeThrough(nullptr, dispId, kind, args);
+}
+
+Variant CompanionObject::InvokeThrough(const std::string* iid, DispId dispId, CallKind kind, std::span<Variant> args) {
   if (dispId < 1 || static_cast<size_t>(dispId) > names_.size()) throw AutomationError(vberr::kNoSuchMember);
   const std::string& name = names_[static_cast<size_t>(dispId - 1)];
   EventLog& log = world_.log();
 
   EventJson call{{"ev", "companion-call"}, {"instance", label_}, {"member", name}, {"kind", KindName(kind)}};
-  for (size_t i = 0; i < def_->operations.size(); ++i)
+  if (iid) call["interface"] = *iid;
+  for (size_t i = 0; !iid && i < def_->operations.size(); ++i)
     if (EqualsNoCase(def_->operations[i], name)) {
       call["operation"] = i + 1;
       break;
@@ -138,25 +182,41 @@ ObjectPtr CompanionObject::ReturnedObject(const std::string& member, const std::
 
 // ------------------------------------------------------------ ResourceObject
 
+namespace {
+constexpr DispId kLoadResString = 1;
+constexpr DispId kGetString = 2;
+}  // namespace
+
 DispId ResourceObject::IdOfName(std::string_view name) {
-  if (EqualsNoCase(name, "GetString")) return 1;
+  if (EqualsNoCase(name, "LoadResString")) return kLoadResString;
+  if (EqualsNoCase(name, "GetString")) return kGetString;
   throw AutomationError(vberr::kNoSuchMember);
 }
 
 DispId ResourceObject::IdOfOwnOperation(int position) {
-  if (position == 1) return 1;
+  if (position == 1 || position == 2) return position;
   throw AutomationError(vberr::kNoSuchMember);
 }
 
 Variant ResourceObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
-  if (dispId != 1 || (kind != CallKind::Method && kind != CallKind::PropertyGet))
+  if ((dispId != kLoadResString && dispId != kGetString) || (kind != CallKind::Method && kind != CallKind::PropertyGet))
     throw AutomationError(vberr::kNoSuchMember);
   if (args.size() != 1) throw AutomationError(vberr::kWrongArgCount);
-  return Text(args[0].toInt32());
+  const int32_t id = args[0].toInt32();
+  if (model_.faults.missingResources.count(id)) {
+    const AutomationError error(326, "Resource with identifier '" + std::to_string(id) + "' not found");
+    log_.Add({{"ev", "fault"},
+              {"object", label_},
+              {"member", dispId == kLoadResString ? "LoadResString" : "GetString"},
+              {"args", EventJson::array({id})},
+              {"error", ErrorJson(error)}});
+    throw error;
+  }
+  return Text(id);
 }
 
 std::string ResourceObject::Text(int32_t id) const {
-  if (auto it = overrides_.find(id); it != overrides_.end()) return it->second;
+  if (auto it = model_.resources.find(id); it != model_.resources.end()) return it->second;
   if (const char* text = FindResourceText(id)) return text;
   // As the resource component answers an id it has no text for.
   throw AutomationError(326, "Resource with identifier '" + std::to_string(id) + "' not found");
@@ -167,8 +227,8 @@ std::string ResourceObject::Text(int32_t id) const {
 ObjectPtr SimObjectFactory::MakeResource() {
   if (!world_.def().resourceRegistered) throw AutomationError(vberr::kCantCreateObject);
   const std::string base(kResourceProgId);
-  return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)),
-                                          world_.def().resources);
+  return std::make_shared<ResourceObject>(base + "#" + std::to_string(world_.NextInstance(base)), world_.def(),
+                                          world_.log());
 }
 
 ObjectPtr SimObjectFactory::MakeCompanion(const std::shared_ptr<const CompanionDef>& def) {

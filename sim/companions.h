@@ -20,7 +20,7 @@ class World;
 
 // A scripted companion: its members answer, raise and write back arguments
 // as the model file describes it; a member it does not list raises 438.
-class CompanionObject final : public SimObject {
+class CompanionObject final : public SimObject, public std::enable_shared_from_this<CompanionObject> {
  public:
   CompanionObject(World& world, std::shared_ptr<const CompanionDef> def, std::string label);
   std::string label() const override { return label_; }
@@ -28,6 +28,12 @@ class CompanionObject final : public SimObject {
   DispId IdOfName(std::string_view name) override;
   DispId IdOfOwnOperation(int position) override;
   Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+  // One of the interfaces the model file lists for it; 13 for any other.
+  ObjectPtr QueryInterface(std::string_view iid) override;
+
+  // A call through one of its other interfaces: recorded with that interface.
+  Variant InvokeThrough(const std::string* iid, DispId id, CallKind kind, std::span<Variant> args);
+  const CompanionDef& def() const { return *def_; }
 
   // One of its named sub-objects, made on first use and kept.
   ObjectPtr SubObject(const std::string& name);
@@ -45,11 +51,13 @@ class CompanionObject final : public SimObject {
 };
 
 // The resource component: texts by string id, from the model file's
-// overrides first, then from the add-in's own resource table.
+// overrides first, then from the add-in's own resource table. Its first own
+// operation is LoadResString (the id by value), its second GetString (the id
+// by reference). An id the model takes away raises 326 and is recorded.
 class ResourceObject final : public SimObject {
  public:
-  ResourceObject(std::string label, const std::map<int32_t, std::string>& overrides)
-      : label_(std::move(label)), overrides_(overrides) {}
+  ResourceObject(std::string label, const ModelDef& model, EventLog& log)
+      : label_(std::move(label)), model_(model), log_(log) {}
   std::string label() const override { return label_; }
 
   DispId IdOfName(std::string_view name) override;
@@ -60,7 +68,8 @@ class ResourceObject final : public SimObject {
 
  private:
   std::string label_;
-  const std::map<int32_t, std::string>& overrides_;
+  const ModelDef& model_;
+  EventLog& log_;
 };
 
 // Creates companions and resource objects by ProgID or class id, as the

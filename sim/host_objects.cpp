@@ -5,6 +5,7 @@
 #include "automation/vb_strings.h"
 #include "shared/host_ids.h"
 #include "sim/companions.h"
+#include "sim/faults.h"
 #include "sim/world.h"
 
 namespace kpx::sim {
@@ -41,6 +42,50 @@ std::optional<std::string> LookUp(const Properties& p, std::string_view tool, st
   return v->second;
 }
 
+// Members by kind of object. Names() answers from these, and so does
+// HostMembersOf, which the model's faults are checked against.
+
+constexpr MemberName kApplicationNames[] = {
+    {"CurrentModel", id::kCurrentModel},
+    {"WriteErrorLog", id::kWriteErrorLog},
+    {"ApplicationPath", id::kApplicationPath},
+    {"ExecuteScript", id::kExecuteScript},
+    {"AddInManager", id::kAddInManager},
+    {"Top", id::kWindowTop},
+    {"Left", id::kWindowLeft},
+    {"Height", id::kWindowHeight},
+    {"Width", id::kWindowWidth},
+    {id::kGetMainWnd, simid::kGetMainWnd},
+};
+constexpr MemberName kManagerNames[] = {{"AddIns", id::kAddIns}};
+// The add-in collection has the first two only.
+constexpr MemberName kCollectionNames[] = {
+    {"Count", id::kCount}, {"GetAt", id::kGetAt}, {"Add", simid::kAdd}, {"RemoveAll", simid::kRemoveAll}};
+constexpr MemberName kMenuEntryNames[] = {{id::kMenuState, simid::kMenuState}};
+// AddContextMenuItem last: a host without context menus lacks it.
+constexpr MemberName kAddInNames[] = {
+    {"Name", id::kAddInName},
+    {"Deactivate", id::kDeactivate},
+    {"Activate", id::kActivate},
+    {"ReadSetting", id::kReadSetting},
+    {"WriteSetting", id::kWriteSetting},
+    {"HelpFile", id::kHelpFile},
+    {"InstallDirectory", id::kInstallDirectory},
+    {"RegistryRoot", id::kRegistryRoot},
+    {id::kEventHandler, simid::kEventHandler},
+    {"AddContextMenuItem", id::kAddContextMenuItem},
+};
+constexpr MemberName kModelNames[] = {{"GetSelectedItems", id::kGetSelectedItems},
+                                      {"GetPropertyValue", id::kGetPropertyValue}};
+constexpr MemberName kClassKindNames[] = {{"Name", id::kName}};
+constexpr MemberName kPackageNames[] = {{"KindTest", id::kKindTest}, {"Name", id::kName}};
+constexpr MemberName kUnitNames[] = {{"IsModifiable", id::kKindTest}};
+constexpr MemberName kPropertyNames[] = {{"Name", id::kName}, {"Value", simid::kValue}, {"ToolName", simid::kToolName}};
+
+std::span<const MemberName> AddInNames(bool contextMenus) {
+  return std::span<const MemberName>(kAddInNames, contextMenus ? std::size(kAddInNames) : std::size(kAddInNames) - 1);
+}
+
 }  // namespace
 
 // ---------------------------------------------------------------- HostObject
@@ -55,21 +100,23 @@ DispId HostObject::IdOfName(std::string_view name) {
 Variant HostObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
   world_.log().CountHostCall();
   for (const MemberName& m : Names())
-    if (m.id == dispId) return Call(dispId, kind, args);
+    if (m.id == dispId) {
+      world_.faults().Check(world_.log(), *this, m.name, args);  // an injected failure replaces the call
+      return Call(dispId, kind, args);
+    }
   NoMember();
 }
 
 // -------------------------------------------------------------- FieldsObject
 
-FieldsObject::FieldsObject(World& world, std::string label, std::vector<Field> fields)
-    : HostObject(world), label_(std::move(label)), fields_(std::move(fields)) {
-  for (const Field& f : fields_) names_.push_back({f.name, f.id});
-}
+FieldsObject::FieldsObject(World& world, std::string label, std::span<const MemberName> names,
+                           std::vector<Variant> values)
+    : HostObject(world), label_(std::move(label)), names_(names), values_(std::move(values)) {}
 
 Variant FieldsObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   Read(kind, args);
-  for (const Field& f : fields_)
-    if (f.id == dispId) return f.value;
+  for (size_t i = 0; i < names_.size() && i < values_.size(); ++i)
+    if (names_[i].id == dispId) return values_[i];
   NoMember();
 }
 
@@ -79,9 +126,7 @@ CollectionObject::CollectionObject(World& world, std::string label, std::vector<
     : HostObject(world), label_(std::move(label)), items_(std::move(items)), editable_(editable) {}
 
 std::span<const MemberName> CollectionObject::Names() const {
-  static constexpr MemberName kEditable[] = {
-      {"Count", id::kCount}, {"GetAt", id::kGetAt}, {"Add", simid::kAdd}, {"RemoveAll", simid::kRemoveAll}};
-  return editable_ ? std::span<const MemberName>(kEditable) : std::span<const MemberName>(kEditable, 2);
+  return editable_ ? std::span<const MemberName>(kCollectionNames) : std::span<const MemberName>(kCollectionNames, 2);
 }
 
 Variant CollectionObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
@@ -120,10 +165,7 @@ MenuEntryObject::MenuEntryObject(World& world, std::string label, std::string ad
       name_(std::move(name)),
       state_(std::move(state)) {}
 
-std::span<const MemberName> MenuEntryObject::Names() const {
-  static constexpr MemberName kNames[] = {{id::kMenuState, simid::kMenuState}};
-  return kNames;
-}
+std::span<const MemberName> MenuEntryObject::Names() const { return kMenuEntryNames; }
 
 Variant MenuEntryObject::Call(DispId, CallKind kind, std::span<Variant> args) {
   if (Reads(kind)) {
@@ -146,22 +188,7 @@ AddInObject::AddInObject(World& world, const AddInDef& def) : HostObject(world),
     eventHandler_ = std::make_shared<CompanionObject>(world, def.eventHandler, label() + ".EventHandler");
 }
 
-std::span<const MemberName> AddInObject::Names() const {
-  // AddContextMenuItem last: a host without context menus lacks it.
-  static constexpr MemberName kNames[] = {
-      {"Name", id::kAddInName},
-      {"Deactivate", id::kDeactivate},
-      {"Activate", id::kActivate},
-      {"ReadSetting", id::kReadSetting},
-      {"WriteSetting", id::kWriteSetting},
-      {"HelpFile", id::kHelpFile},
-      {"InstallDirectory", id::kInstallDirectory},
-      {"RegistryRoot", id::kRegistryRoot},
-      {id::kEventHandler, simid::kEventHandler},
-      {"AddContextMenuItem", id::kAddContextMenuItem},
-  };
-  return std::span<const MemberName>(kNames, def_.contextMenus ? std::size(kNames) : std::size(kNames) - 1);
-}
+std::span<const MemberName> AddInObject::Names() const { return AddInNames(def_.contextMenus); }
 
 Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   EventLog& log = world_.log();
@@ -228,10 +255,7 @@ Variant AddInObject::Call(DispId dispId, CallKind kind, std::span<Variant> args)
 
 // -------------------------------------------------------- AddInManagerObject
 
-std::span<const MemberName> AddInManagerObject::Names() const {
-  static constexpr MemberName kNames[] = {{"AddIns", id::kAddIns}};
-  return kNames;
-}
+std::span<const MemberName> AddInManagerObject::Names() const { return kManagerNames; }
 
 Variant AddInManagerObject::Call(DispId, CallKind kind, std::span<Variant> args) {
   Read(kind, args);
@@ -243,21 +267,7 @@ Variant AddInManagerObject::Call(DispId, CallKind kind, std::span<Variant> args)
 ApplicationObject::ApplicationObject(World& world, const ApplicationDef& def, ObjectPtr manager)
     : HostObject(world), def_(def), manager_(std::move(manager)), window_{def.top, def.left, def.height, def.width} {}
 
-std::span<const MemberName> ApplicationObject::Names() const {
-  static constexpr MemberName kNames[] = {
-      {"CurrentModel", id::kCurrentModel},
-      {"WriteErrorLog", id::kWriteErrorLog},
-      {"ApplicationPath", id::kApplicationPath},
-      {"ExecuteScript", id::kExecuteScript},
-      {"AddInManager", id::kAddInManager},
-      {"Top", id::kWindowTop},
-      {"Left", id::kWindowLeft},
-      {"Height", id::kWindowHeight},
-      {"Width", id::kWindowWidth},
-      {id::kGetMainWnd, simid::kGetMainWnd},
-  };
-  return kNames;
-}
+std::span<const MemberName> ApplicationObject::Names() const { return kApplicationNames; }
 
 Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   EventLog& log = world_.log();
@@ -317,11 +327,7 @@ Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant>
 
 // --------------------------------------------------------------- ModelObject
 
-std::span<const MemberName> ModelObject::Names() const {
-  static constexpr MemberName kNames[] = {{"GetSelectedItems", id::kGetSelectedItems},
-                                          {"GetPropertyValue", id::kGetPropertyValue}};
-  return kNames;
-}
+std::span<const MemberName> ModelObject::Names() const { return kModelNames; }
 
 Variant ModelObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   if (dispId == id::kGetSelectedItems) {
@@ -462,11 +468,9 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       const std::string tool = args[0].toString(), name = args[1].toString();
       std::optional<std::string> value = LookUp(properties_, tool, name);
       if (!value) return Variant::Nothing();
-      return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "property:" + key + "/" + tool + "/" + name,
-          std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(name)},
-                                           {"Value", simid::kValue, Variant(*value)},
-                                           {"ToolName", simid::kToolName, Variant(tool)}}));
+      return ObjectPtr(std::make_shared<FieldsObject>(world_, "property:" + key + "/" + tool + "/" + name,
+                                                      kPropertyNames,
+                                                      std::vector<Variant>{Variant(name), Variant(*value), Variant(tool)}));
     }
     case id::kCreateProperty: {
       Read(kind, args, 3, 4);
@@ -522,14 +526,13 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       return Ref(def_.nestedIn);
     case simid::kClassKind:
       Read(kind, args);
-      return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "classkind:" + key, std::vector<FieldsObject::Field>{{"Name", id::kName, Variant(def_.classKind)}}));
+      return ObjectPtr(std::make_shared<FieldsObject>(world_, "classkind:" + key, kClassKindNames,
+                                                      std::vector<Variant>{Variant(def_.classKind)}));
     case id::kGetClassKind:
       Read(kind, args);
       return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "package:" + def_.package,
-          std::vector<FieldsObject::Field>{{"KindTest", id::kKindTest, Variant(def_.packageEditable)},
-                                           {"Name", id::kName, Variant(def_.package)}}));
+          world_, "package:" + def_.package, kPackageNames,
+          std::vector<Variant>{Variant(def_.packageEditable), Variant(def_.package)}));
     case simid::kGetAssignedLanguage:
       Read(kind, args);
       return def_.language;
@@ -577,9 +580,8 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       return def_.relationText;
     case id::kModuleDependencyUnit:
       Read(kind, args);
-      return ObjectPtr(std::make_shared<FieldsObject>(
-          world_, "unit:" + key,
-          std::vector<FieldsObject::Field>{{"IsModifiable", id::kKindTest, Variant(def_.unitModifiable)}}));
+      return ObjectPtr(std::make_shared<FieldsObject>(world_, "unit:" + key, kUnitNames,
+                                                      std::vector<Variant>{Variant(def_.unitModifiable)}));
 
     // ---- association
     case id::kGetOtherRole: {
@@ -612,6 +614,49 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     default:
       NoMember();
   }
+}
+
+// ------------------------------------------------------------ by label
+
+std::optional<std::span<const MemberName>> HostMembersOf(const ModelDef& model, std::string_view label) {
+  using Names = std::span<const MemberName>;
+  auto after = [&](std::string_view prefix) -> std::optional<std::string_view> {
+    if (label.size() <= prefix.size() || label.substr(0, prefix.size()) != prefix) return std::nullopt;
+    return label.substr(prefix.size());
+  };
+  auto kindOf = [&](std::string_view key) -> std::string {
+    const ElementDef* e = model.FindElement(key);
+    return e ? e->kind : std::string();
+  };
+  if (label == "$app") return Names(kApplicationNames);
+  if (label == "$app.AddInManager") return Names(kManagerNames);
+  if (label == "$app.AddIns") return Names(kCollectionNames, 2);
+  if (label == "$model") return Names(kModelNames);
+  if (auto id = after("addin:")) {
+    const AddInDef* a = model.FindAddIn(*id);
+    if (a) return AddInNames(a->contextMenus);
+  } else if (auto key = after("element:")) {
+    const std::string kind = kindOf(*key);
+    if (!kind.empty()) return Names(NamesFor(kind));
+  } else if (after("menu:")) {
+    return Names(kMenuEntryNames);
+  } else if (auto what = after("collection:")) {
+    if (*what == "selection") return Names(kCollectionNames);
+    for (std::string_view list : {".components", ".inherits", ".related"})
+      if (what->size() > list.size() && what->substr(what->size() - list.size()) == list &&
+          kindOf(what->substr(0, what->size() - list.size())) == "Class")
+        return Names(kCollectionNames);
+  } else if (auto key = after("classkind:")) {
+    if (kindOf(*key) == "Class") return Names(kClassKindNames);
+  } else if (auto name = after("package:")) {
+    for (const ElementDef& e : model.elements)
+      if (e.kind == "Class" && e.package == *name) return Names(kPackageNames);
+  } else if (auto key = after("unit:")) {
+    if (kindOf(*key) == "ModuleVisibilityRelationship") return Names(kUnitNames);
+  } else if (after("property:")) {
+    return Names(kPropertyNames);
+  }
+  return std::nullopt;
 }
 
 }  // namespace kpx::sim

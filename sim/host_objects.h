@@ -7,6 +7,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -42,6 +43,11 @@ inline constexpr DispId kAdd = 208;
 inline constexpr DispId kRemoveAll = 211;
 }  // namespace simid
 
+// The members a host object answers, found by the label the event log gives
+// it ("$app", "addin:VC++", "element:CFoo", "menu:CClass_UpdateCode" ...);
+// nothing when no host object of this model can carry that label.
+std::optional<std::span<const MemberName>> HostMembersOf(const ModelDef& model, std::string_view label);
+
 class HostObject : public SimObject {
  public:
   explicit HostObject(World& world) : world_(world) {}
@@ -56,15 +62,10 @@ class HostObject : public SimObject {
 };
 
 // Read-only fields: the small objects the host hands out (class kind,
-// package, module unit, property).
+// package, module unit, property). `values` go with `names`, in order.
 class FieldsObject final : public HostObject {
  public:
-  struct Field {
-    std::string_view name;
-    DispId id;
-    Variant value;
-  };
-  FieldsObject(World& world, std::string label, std::vector<Field> fields);
+  FieldsObject(World& world, std::string label, std::span<const MemberName> names, std::vector<Variant> values);
   std::string label() const override { return label_; }
 
  protected:
@@ -73,8 +74,8 @@ class FieldsObject final : public HostObject {
 
  private:
   std::string label_;
-  std::vector<Field> fields_;
-  std::vector<MemberName> names_;
+  std::span<const MemberName> names_;
+  std::vector<Variant> values_;
 };
 
 // A 1-based collection. Model collections can be filled and emptied by the

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <functional>
 #include <limits>
 #include <unordered_set>
 
@@ -184,6 +185,28 @@ class TextWalker {
       SkipBlanks();
     }
   }
+
+  // Step by step through everything, for walking the document alongside:
+  // into an object or list, past a member's key and colon, past a scalar,
+  // past the comma between two, and out past the closing bracket.
+  void Open() {
+    ++i_;
+    SkipBlanks();
+  }
+  size_t Key() {
+    const size_t at = i_;
+    SkipString();
+    SkipBlanks();
+    ++i_;  // ':'
+    SkipBlanks();
+    return at;
+  }
+  void Scalar() {
+    SkipValue();
+    SkipBlanks();
+  }
+  void Comma() { Open(); }
+  void Close() { Open(); }
 
   // From the start of a list to the start of each element, one by one.
   bool FirstElement() {
@@ -460,6 +483,49 @@ int JsonSource::KeyLineOfValue(const InputJson& object, std::string_view key) co
   if (it == members.end()) return LineAt(*route, false);
   route->push_back(static_cast<size_t>(it - members.begin()));
   return LineAt(*route, true);
+}
+
+void JsonSource::ForEachLine(const std::function<void(const InputJson&, int, int)>& each) const {
+  struct Level {
+    const InputJson* value;
+    size_t next;
+  };
+  TextWalker walker(text_);
+  LineCounter counter(text_);
+  const int rootLine = counter.At(walker.at());
+  each(root_, rootLine, rootLine);
+  std::vector<Level> stack;
+  auto enter = [&](const InputJson& v) {
+    if (v.is_object() || v.is_array()) {
+      walker.Open();
+      stack.push_back({&v, 0});
+    } else {
+      walker.Scalar();
+    }
+  };
+  enter(root_);
+  while (!stack.empty()) {
+    Level& top = stack.back();
+    const InputJson& v = *top.value;
+    if (top.next == v.size()) {
+      walker.Close();
+      stack.pop_back();
+      continue;
+    }
+    if (top.next > 0) walker.Comma();
+    const size_t i = top.next++;
+    int keyLine = 0;
+    const InputJson* child = nullptr;
+    if (v.is_object()) {
+      keyLine = counter.At(walker.Key());
+      child = &(v.get_ref<const InputJson::object_t&>().begin() + static_cast<std::ptrdiff_t>(i))->second;
+    } else {
+      child = &v.get_ref<const InputJson::array_t&>()[i];
+    }
+    const int line = counter.At(walker.at());
+    each(*child, line, v.is_object() ? keyLine : line);
+    enter(*child);  // may make `top` dangle
+  }
 }
 
 std::vector<int> JsonSource::ElementLines(const InputJson& list) const {

@@ -6,6 +6,7 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <initializer_list>
 #include <nlohmann/json.hpp>
 #include <optional>
@@ -64,6 +65,10 @@ class JsonSource {
   int KeyLineOfValue(const InputJson& object, std::string_view key) const;
   // The lines of the elements of the list `list`, found in one walk.
   std::vector<int> ElementLines(const InputJson& list) const;
+  // Every value in document order with its line and its key's line (the
+  // value's own for list elements and the root), in one walk: for checking
+  // the lines of a whole document at once.
+  void ForEachLine(const std::function<void(const InputJson& value, int line, int keyLine)>& each) const;
 
  private:
   // Where a value lies: at each level, the place of the member or element

@@ -4,9 +4,11 @@
 #include <cctype>
 #include <cmath>
 #include <limits>
+#include <tuple>
 
 #include "automation/automation_error.h"
 #include "automation/vb_strings.h"
+#include "sim/faults.h"
 #include "sim/windows_path.h"
 
 namespace kpx::sim {
@@ -139,17 +141,6 @@ std::string HexBytes(const Node& n) {
   return data;
 }
 
-platform::RegistryValue RegistryValueOf(const Node& n) {
-  if (n.IsString()) return {platform::kRegSz, n.String() + '\0'};
-  if (n.json().is_number()) return {platform::kRegDword, DwordBytes(DwordOf(n))};
-  if (!n.IsObject() || n.json().size() != 1)
-    n.Fail("a registry value is a string, a number, or one of {\"sz\": ...}, {\"dword\": ...}, {\"binary\": ...}");
-  n.ExpectKeys({"sz", "dword", "binary"});
-  if (auto sz = n.Find("sz")) return {platform::kRegSz, sz->String() + '\0'};
-  if (auto dw = n.Find("dword")) return {platform::kRegDword, DwordBytes(DwordOf(*dw))};
-  return {platform::kRegBinary, HexBytes(n.Member("binary"))};
-}
-
 int ParseNumberPart(const Node& n, const std::string& text, size_t pos, size_t len, int lo, int hi) {
   if (pos + len > text.size()) n.Fail("malformed \"" + text + "\"");
   int v = 0;
@@ -185,26 +176,40 @@ void CheckKeyName(const Node& registry, const std::string& fullKey, std::string_
 
 }  // namespace
 
+platform::RegistryValue ParseRegistryValue(const Node& n) {
+  if (n.IsString()) return {platform::kRegSz, n.String() + '\0'};
+  if (n.json().is_number()) return {platform::kRegDword, DwordBytes(DwordOf(n))};
+  if (!n.IsObject() || n.json().size() != 1)
+    n.Fail("a registry value is a string, a number, or one of {\"sz\": ...}, {\"dword\": ...}, {\"binary\": ...}");
+  n.ExpectKeys({"sz", "dword", "binary"});
+  if (auto sz = n.Find("sz")) return {platform::kRegSz, sz->String() + '\0'};
+  if (auto dw = n.Find("dword")) return {platform::kRegDword, DwordBytes(DwordOf(*dw))};
+  return {platform::kRegBinary, HexBytes(n.Member("binary"))};
+}
+
+std::pair<platform::RootKey, std::string> ParseRegistryKey(const Node& registry, const std::string& fullKey) {
+  const size_t slash = fullKey.find('\\');
+  std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
+  if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
+    registry.FailKey(fullKey,
+                     "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+  CheckKeyName(registry, fullKey, std::string_view(fullKey).substr(slash + 1));
+  return {*root, fullKey.substr(slash + 1)};
+}
+
 std::vector<RegistryEntry> ParseRegistry(const Node& node) {
   std::vector<RegistryEntry> out;
   for (const auto& [fullKey, values] : node.Members()) {
-    const size_t slash = fullKey.find('\\');
-    std::optional<platform::RootKey> root = RootOf(fullKey.substr(0, slash));
-    if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
-      node.FailKey(fullKey,
-                   "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
-    CheckKeyName(node, fullKey, fullKey.substr(slash + 1));
-    values.ExpectObject("an object of values");
     RegistryEntry keyOnly;
-    keyOnly.root = *root;
-    keyOnly.key = fullKey.substr(slash + 1);
+    std::tie(keyOnly.root, keyOnly.key) = ParseRegistryKey(node, fullKey);
+    values.ExpectObject("an object of values");
     out.push_back(keyOnly);
     for (const auto& [name, value] : values.Members()) {
       if (name.find_first_of(std::string_view("\r\n\0", 3)) != std::string::npos)
         values.FailKey(name, "a value name holds a line break or a NUL, which the registry file cannot hold");
       RegistryEntry e = keyOnly;
       e.name = name == "@" ? "" : name;
-      e.value = RegistryValueOf(value);
+      e.value = ParseRegistryValue(value);
       out.push_back(std::move(e));
     }
   }
@@ -307,7 +312,7 @@ class ModelReader {
 
   ModelDef Read() {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
-                      "resources", "resourceComponent", "model"});
+                      "resources", "resourceComponent", "model", "faults"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
     ReadFilesAndFolders(root_.Find("files"), root_.Find("folders"));
     if (auto n = root_.Find("clock")) m_.clock = ParseClock(*n);
@@ -323,6 +328,8 @@ class ModelReader {
     if (auto n = root_.Find("addins")) ReadAddIns(*n);
     if (auto n = root_.Find("companions"))
       for (const Node& c : n->Elements()) m_.companions.push_back(ReadCompanion(c, true));
+    // Last: faults name add-ins, elements and registry keys.
+    if (auto n = root_.Find("faults")) ReadFaults(*n, m_);
     return std::move(m_);
   }
 
@@ -600,7 +607,7 @@ class ModelReader {
   std::shared_ptr<const CompanionDef> ReadCompanion(const Node& n, bool creatable) {
     auto c = std::make_shared<CompanionDef>();
     if (creatable) {
-      n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "members", "objects"});
+      n.ExpectKeys({"comment", "progid", "clsid", "create", "operations", "interfaces", "members", "objects"});
       c->progid = n.StringOr("progid", "");
       c->clsid = n.StringOr("clsid", "");
       if (c->progid.empty() && c->clsid.empty()) n.Fail("a companion needs a \"progid\" or a \"clsid\"");
@@ -613,10 +620,17 @@ class ModelReader {
         }
       }
     } else {
-      n.ExpectKeys({"comment", "operations", "members", "objects"});
+      n.ExpectKeys({"comment", "operations", "interfaces", "members", "objects"});
     }
     if (auto ops = n.Find("operations"))
       for (const Node& op : ops->Elements()) c->operations.push_back(op.String());
+    if (auto ifs = n.Find("interfaces"))
+      for (const auto& [iid, list] : ifs->Members()) {
+        if (iid.size() != 38 || iid.front() != '{' || iid.back() != '}')
+          ifs->FailKey(iid, "an interface id is written \"{XXXXXXXX-XXXX-XXXX-XXXX-XXXXXXXXXXXX}\"");
+        std::vector<std::string>& members = c->interfaces[iid];
+        for (const Node& m : list.Elements()) members.push_back(m.String());
+      }
     if (auto objs = n.Find("objects"))
       for (const auto& [name, def] : objs->Members()) c->objects[name] = ReadCompanion(def, false);
     if (auto members = n.Find("members"))

@@ -12,6 +12,7 @@
 #include <string>
 #include <string_view>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "platform/platform.h"
@@ -67,6 +68,8 @@ struct CompanionDef {
   std::string clsid;
   std::optional<ErrorDef> createError;
   std::vector<std::string> operations;  // its own interface, in order
+  // Its other interfaces, by interface id: each one's members, in order.
+  std::map<std::string, std::vector<std::string>, NoCaseLess> interfaces;
   std::map<std::string, MemberDef, NoCaseLess> members;
   std::map<std::string, std::shared_ptr<const CompanionDef>> objects;
 
@@ -117,6 +120,41 @@ struct ElementDef {
   bool navigable = false;
 };
 
+// ------------------------------------------------------------------ faults
+// Failures the model injects into the add-in's world, so that every failure
+// path of the add-in can be played. Read from the model's "faults".
+
+// A call of a host object's member that raises: the `call`-th call of
+// `member` on the objects labelled `object` (every call when `call` is 0)
+// whose leading arguments, as text, equal `args` without regard to letter
+// case (any arguments when `args` is empty).
+struct CallFaultDef {
+  std::string object;  // the label, as the event log names the object
+  std::string member;  // as the object spells it
+  int64_t call = 0;
+  std::vector<std::string> args;
+  ErrorDef error;
+};
+
+// A registry key the add-in cannot create, or values that read back other
+// than the registry holds them.
+struct RegistryFaultDef {
+  platform::RootKey root = platform::RootKey::LocalMachine;
+  std::string key;
+  bool cannotCreate = false;
+  // Value name ("" the default value) to what every read gives; nothing:
+  // the value reads as missing.
+  std::map<std::string, std::optional<platform::RegistryValue>, NoCaseLess> reads;
+};
+
+struct FaultsDef {
+  std::vector<CallFaultDef> calls;
+  std::vector<RegistryFaultDef> registry;
+  std::set<int32_t> missingResources;
+
+  bool empty() const { return calls.empty() && registry.empty() && missingResources.empty(); }
+};
+
 struct ModelDef {
   std::vector<RegistryEntry> registry;  // keys and value names as REGEDIT4 can write them
   std::vector<std::pair<std::string, std::string>> files;
@@ -130,6 +168,7 @@ struct ModelDef {
   Properties modelProperties;
   std::vector<ElementDef> elements;  // added through AddElement, which keeps them findable
   std::vector<std::string> selection;
+  FaultsDef faults;
 
   const ElementDef* FindElement(std::string_view key) const;
   // Where the element is in `elements`.
@@ -162,6 +201,10 @@ ModelDef LoadModel(const JsonSource& source);
 
 // Pieces the scenario file shares with the model file.
 std::vector<RegistryEntry> ParseRegistry(const Node& node);
+// One key of a "registry" object, "HKLM\\..." or the like: its root and path.
+std::pair<platform::RootKey, std::string> ParseRegistryKey(const Node& registry, const std::string& fullKey);
+// A registry value in any of the forms of a model's "registry".
+platform::RegistryValue ParseRegistryValue(const Node& node);
 ClockSetting ParseClock(const Node& node);
 // {"number": n, "description": "..."}
 ErrorDef ParseError(const Node& node);

@@ -1,6 +1,7 @@
 #include "sim/scenario_file.h"
 
 #include <algorithm>
+#include <span>
 
 #include "addin/api_members.h"
 #include "automation/vb_strings.h"
@@ -18,8 +19,65 @@ std::optional<std::filesystem::path> ScenarioModelPath(const JsonSource& scenari
 
 namespace {
 
-constexpr std::string_view kActionKeys[] = {"call",    "select", "answer",      "clock",
-                                            "release", "create", "setRegistry", "setFile"};
+constexpr std::string_view kActionKeys[] = {"call",   "select",      "answer",  "clock",   "release",
+                                            "create", "setRegistry", "setFile", "scanner", "dictionary"};
+
+// What a scenario can make besides the add-in object, and the members it can
+// call on each: the add-in's token scanner and a keyed collection of the
+// kind the scanner takes as its delimiters.
+constexpr std::string_view kTokenScanner = "kpxAddIn.TokenScanner";
+constexpr std::string_view kDictionary = "Scripting.Dictionary";
+struct UsableMember {
+  std::string_view name;
+  bool property;
+};
+constexpr UsableMember kScannerMembers[] = {{"Init", false},         {"NextToken", false},  {"ReplaceCurrentToken", false},
+                                            {"ScanString", true},    {"CurrentToken", true}, {"Delimitors", true}};
+constexpr UsableMember kDictionaryMembers[] = {{"Add", false},    {"Exists", false},   {"Remove", false},
+                                               {"RemoveAll", false}, {"Count", true}, {"Item", true},
+                                               {"CompareMode", true}};
+
+// {"scanner": "Member", "args": [...], "kind": "..."}: a property is read
+// without arguments and written with them (put; putref for an object).
+void ReadUse(const Node& n, const ModelDef& model, Action& a) {
+  n.ExpectKeys({"comment", std::string_view(a.object), "args", "kind"});
+  const Node name = n.Member(a.object);
+  const std::span<const UsableMember> members =
+      a.object == "scanner" ? std::span<const UsableMember>(kScannerMembers) : std::span<const UsableMember>(kDictionaryMembers);
+  const UsableMember* member = nullptr;
+  std::string known;
+  for (const UsableMember& m : members) {
+    if (EqualsNoCase(m.name, name.String())) member = &m;
+    known += (known.empty() ? "" : ", ") + std::string(m.name);
+  }
+  if (!member) name.Fail("the " + a.object + " has no member \"" + name.String() + "\" (it has " + known + ")");
+  a.member = member->name;
+  std::vector<Node> args;
+  if (auto list = n.Find("args")) args = list->Elements();
+  for (const Node& arg : args) {
+    if (!(arg.IsString() && arg.String() == "$dictionary")) CheckValue(arg, model, nullptr, false);
+    a.args.push_back(arg.json());
+  }
+  a.kind = CallKind::Method;
+  if (member->property && !args.empty())
+    a.kind = args.back().IsString() && args.back().String() == "$dictionary" ? CallKind::PropertyPutRef
+                                                                            : CallKind::PropertyPut;
+  else if (member->property)
+    a.kind = CallKind::PropertyGet;
+  if (auto k = n.Find("kind")) {
+    const std::string kind = k->String();
+    if (kind == "method")
+      a.kind = CallKind::Method;
+    else if (kind == "get")
+      a.kind = CallKind::PropertyGet;
+    else if (kind == "put")
+      a.kind = CallKind::PropertyPut;
+    else if (kind == "putref")
+      a.kind = CallKind::PropertyPutRef;
+    else
+      k->Fail("a kind is \"method\", \"get\", \"put\" or \"putref\"");
+  }
+}
 
 const ApiMember* FindMember(std::string_view name) {
   for (const ApiMember& m : ApiMembers())
@@ -70,8 +128,10 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   Scenario s;
   const Node list = root.Member("actions");
   std::vector<Node> actions = list.Elements();
-  s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create");
+  s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create") ||
+                     actions.front().json().at("create").is_string();
   bool alive = s.implicitCreate;
+  bool scanner = false, dictionary = false;  // the scenario's own objects made so far
   const std::vector<int> lines = source.ElementLines(list.json());
   // The files and folders as the steps meet them, after the model's.
   PathPlan plan;
@@ -88,18 +148,45 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       if (key == "comment" || key == "args" || key == "kind") continue;
       if (std::find(std::begin(kActionKeys), std::end(kActionKeys), key) == std::end(kActionKeys))
         n.FailKey(key, "unknown action \"" + key +
-                           "\" (expected call, select, answer, clock, release, create, setRegistry or setFile)");
+                           "\" (expected call, select, answer, clock, release, create, setRegistry, setFile, "
+                           "scanner or dictionary)");
       if (!which.empty()) n.FailKey(key, "one action per entry: \"" + which + "\" and \"" + key + "\"");
       which = key;
     }
     if (which.empty())
-      n.Fail("an action needs one of call, select, answer, clock, release, create, setRegistry, setFile");
+      n.Fail("an action needs one of call, select, answer, clock, release, create, setRegistry, setFile, scanner, "
+             "dictionary");
     const Node body = n.Member(which);
 
     if (which == "call") {
       a.type = Action::Type::Call;
       ReadCall(n, model, a);
       if (!alive) body.Fail("the add-in object was released: add {\"create\": true} before calling it again");
+    } else if (which == "scanner" || which == "dictionary") {
+      a.type = Action::Type::Use;
+      a.object = which;
+      ReadUse(n, model, a);
+      const bool made = which == "scanner" ? scanner : dictionary;
+      if (!made)
+        body.Fail("no " + which + " yet: add {\"create\": \"" +
+                  std::string(which == "scanner" ? kTokenScanner : kDictionary) + "\"} first");
+      for (const Node& arg : n.Find("args") ? n.Member("args").Elements() : std::vector<Node>{})
+        if (arg.IsString() && arg.String() == "$dictionary" && !dictionary)
+          arg.Fail("no dictionary yet: add {\"create\": \"Scripting.Dictionary\"} first");
+    } else if (which == "create" && body.IsString()) {
+      n.ExpectKeys({"comment", "create"});
+      a.type = Action::Type::Create;
+      a.object = body.String();
+      if (EqualsNoCase(a.object, kTokenScanner)) {
+        a.object = kTokenScanner;
+        scanner = true;
+      } else if (EqualsNoCase(a.object, kDictionary)) {
+        a.object = kDictionary;
+        dictionary = true;
+      } else {
+        body.Fail("a scenario creates the add-in ({\"create\": true}), \"kpxAddIn.TokenScanner\" or "
+                  "\"Scripting.Dictionary\", not \"" + a.object + "\"");
+      }
     } else {
       n.ExpectKeys({"comment", std::string_view(which)});
       a.raw = n.json();

@@ -16,7 +16,7 @@
 namespace kpx::sim {
 
 struct Action {
-  enum class Type { Call, Select, Answer, Clock, Release, Create, SetRegistry, SetFile };
+  enum class Type { Call, Select, Answer, Clock, Release, Create, SetRegistry, SetFile, Use };
   Type type = Type::Call;
   int line = 0;
   InputJson raw;  // a change of the world as written, for the log; not kept for calls
@@ -28,6 +28,12 @@ struct Action {
   CallKind kind = CallKind::Method;
   bool kindGiven = false;
   std::vector<InputJson> args;
+
+  // Create: what is made ("" the add-in object). Use: which of the
+  // scenario's own objects is called ("scanner" or "dictionary"), with
+  // `member`, `kind` and `args` as for Call; "$dictionary" in `args` is the
+  // scenario's dictionary.
+  std::string object;
 
   std::vector<std::string> select;
   int answer = 0;

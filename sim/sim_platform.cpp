@@ -7,6 +7,7 @@
 #include <stdexcept>
 
 #include "automation/vb_strings.h"
+#include "sim/faults.h"
 
 namespace kpx::sim {
 
@@ -148,13 +149,16 @@ EventJson RegistryValueJson(const platform::RegistryValue& value) {
 
 std::optional<platform::RegistryValue> RecordingRegistry::QueryValue(platform::RootKey root, std::string_view key,
                                                                      std::string_view name) {
-  std::optional<platform::RegistryValue> v = inner_.QueryValue(root, key, name);
-  log_.Add({{"ev", "registry-read"},
-            {"root", RootName(root)},
-            {"key", key},
-            {"name", name},
-            {"type", v ? EventJson(RegistryTypeName(v->type)) : EventJson()},
-            {"value", v ? RegistryValueJson(*v) : EventJson()}});
+  const auto injected = InjectedRead(faults_, root, key, name);
+  std::optional<platform::RegistryValue> v = injected ? *injected : inner_.QueryValue(root, key, name);
+  EventJson ev{{"ev", "registry-read"},
+               {"root", RootName(root)},
+               {"key", key},
+               {"name", name},
+               {"type", v ? EventJson(RegistryTypeName(v->type)) : EventJson()},
+               {"value", v ? RegistryValueJson(*v) : EventJson()}};
+  if (injected) ev["fault"] = true;
+  log_.Add(std::move(ev));
   return v;
 }
 
@@ -172,11 +176,14 @@ bool RecordingRegistry::SetValue(platform::RootKey root, std::string_view key, s
 }
 
 platform::KeyDisposition RecordingRegistry::CreateKey(platform::RootKey root, std::string_view key) {
-  const platform::KeyDisposition d = inner_.CreateKey(root, key);
+  const bool injected = InjectedCreateFailure(faults_, root, key);
+  const platform::KeyDisposition d = injected ? platform::KeyDisposition::Failed : inner_.CreateKey(root, key);
   const char* name = d == platform::KeyDisposition::Created  ? "created"
                      : d == platform::KeyDisposition::Opened ? "opened"
                                                              : "failed";
-  log_.Add({{"ev", "registry-create"}, {"root", RootName(root)}, {"key", key}, {"disposition", name}});
+  EventJson ev{{"ev", "registry-create"}, {"root", RootName(root)}, {"key", key}, {"disposition", name}};
+  if (injected) ev["fault"] = true;
+  log_.Add(std::move(ev));
   return d;
 }
 

@@ -75,9 +75,12 @@ class SimUserInterface final : public platform::UserInterface {
 
 // ---------------------------------------------------------------- registry
 
+// Where the model injects a registry fault, the fault answers instead of the
+// registry, and the event says so ("fault": true).
 class RecordingRegistry final : public platform::Registry {
  public:
-  RecordingRegistry(platform::Registry& inner, EventLog& log) : inner_(inner), log_(log) {}
+  RecordingRegistry(platform::Registry& inner, EventLog& log, const FaultsDef& faults)
+      : inner_(inner), log_(log), faults_(faults) {}
   std::optional<platform::RegistryValue> QueryValue(platform::RootKey root, std::string_view key,
                                                     std::string_view name) override;
   bool SetValue(platform::RootKey root, std::string_view key, std::string_view name,
@@ -89,6 +92,7 @@ class RecordingRegistry final : public platform::Registry {
  private:
   platform::Registry& inner_;
   EventLog& log_;
+  const FaultsDef& faults_;
 };
 
 // "HKLM" or "HKCU".

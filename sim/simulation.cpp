@@ -2,25 +2,33 @@
 
 #include <stdexcept>
 
+#include "automation/dictionary.h"
 #include "automation/error_styles.h"
+#include "shared/token_scanner_object.h"
 
 namespace kpx::sim {
 
-Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn)
+Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn,
+                       ScenarioObjectFactories makeObjects)
     : model_(model),
       env_(environment),
       world_(model, log_),
       ui_(log_),
       factory_(world_),
-      debugLog_(platform::Platform{env_.registry, env_.files, clock_, factory_, ui_}),
-      registry_(env_.registry, log_),
+      faultyRegistry_(env_.registry, model.faults),
+      debugLog_(platform::Platform{faultyRegistry_, env_.files, clock_, factory_, ui_}),
+      registry_(env_.registry, log_, model.faults),
       files_(env_.files, log_, debugLog_),
       recordingClock_(clock_, log_),
       objects_(factory_, log_),
       platform_{registry_, files_, recordingClock_, objects_, ui_},
       module_(platform_),
-      makeAddIn_(std::move(makeAddIn)) {
+      makeAddIn_(std::move(makeAddIn)),
+      makeObjects_(std::move(makeObjects)) {
   if (!makeAddIn_) makeAddIn_ = [this]() -> ObjectPtr { return CreateApi(module_); };
+  if (!makeObjects_.scanner)
+    makeObjects_.scanner = [this]() -> ObjectPtr { return std::make_shared<TokenScannerObject>(module_.platform().objects); };
+  if (!makeObjects_.dictionary) makeObjects_.dictionary = []() -> ObjectPtr { return std::make_shared<Dictionary>(); };
 }
 
 Simulation::~Simulation() {
@@ -32,6 +40,9 @@ void Simulation::Prepare() {
   if (prepared_) return;
   prepared_ = true;
   SeedRegistry(model_.registry);
+  // Every Windows machine has a drive C, files or not: a debug log at its
+  // root ("C:\tzndebuglog.txt", the logger's default) can be written.
+  env_.seeder.MakeFolder("C:\\");
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
   for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);
   clock_.Set(model_.clock);
@@ -101,7 +112,13 @@ void Simulation::Apply(const Action& a) {
       Call(a);
       break;
     case Action::Type::Create:
-      Create();
+      if (a.object.empty())
+        Create();
+      else
+        MakeObject(a);
+      break;
+    case Action::Type::Use:
+      Use(a);
       break;
     case Action::Type::Release:
       Release(false);
@@ -191,6 +208,65 @@ void Simulation::Call(const Action& a) {
               {"description", e.description()},
               {"hostCalls", log_.hostCalls() - before}});
   }
+}
+
+// The scenario's own objects are not the host's: their calls are no host
+// calls, and an object they answer is shown only as there or not (the same
+// dictionary is a different wrapper each time it crosses COM).
+namespace {
+
+EventJson ShownValue(const EventLog& log, const Variant& v) {
+  if (v.isObject()) return {{"object", v.isNothing() ? EventJson() : EventJson(true)}};
+  return log.Value(v);
+}
+
+const char* KindText(CallKind kind) {
+  switch (kind) {
+    case CallKind::PropertyGet: return "get";
+    case CallKind::PropertyPut: return "put";
+    case CallKind::PropertyPutRef: return "putref";
+    default: return "method";
+  }
+}
+
+}  // namespace
+
+void Simulation::MakeObject(const Action& a) {
+  const bool scanner = a.object == "kpxAddIn.TokenScanner";
+  EventJson ev{{"ev", "create"}, {"object", a.object}};
+  try {
+    (scanner ? scanner_ : dictionary_) = (scanner ? makeObjects_.scanner : makeObjects_.dictionary)();
+    ev["ok"] = true;
+  } catch (...) {
+    (scanner ? scanner_ : dictionary_) = nullptr;
+    ev["ok"] = false;
+    ev["error"] = ErrorJson(CurrentError());
+  }
+  log_.Add(std::move(ev));
+}
+
+void Simulation::Use(const Action& a) {
+  const ObjectPtr& target = a.object == "scanner" ? scanner_ : dictionary_;
+  EventJson ev{{"ev", a.object + "-call"}, {"member", a.member}, {"kind", KindText(a.kind)}};
+  std::vector<Variant> args;
+  EventJson shown = EventJson::array();
+  for (const InputJson& arg : a.args) {
+    args.push_back(arg.is_string() && arg.get<std::string>() == "$dictionary" ? Variant(dictionary_)
+                                                                               : world_.ToVariant(arg));
+    shown.push_back(ShownValue(log_, args.back()));
+  }
+  ev["args"] = std::move(shown);
+  if (!target) {
+    ev["skipped"] = "its creation failed";
+    log_.Add(std::move(ev));
+    return;
+  }
+  try {
+    ev["result"] = ShownValue(log_, target->Invoke(target->IdOfName(a.member), a.kind, args));
+  } catch (...) {
+    ev["error"] = ErrorJson(CurrentError());
+  }
+  log_.Add(std::move(ev));
 }
 
 }  // namespace kpx::sim

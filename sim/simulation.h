@@ -10,6 +10,7 @@
 #include "shared/module.h"
 #include "sim/companions.h"
 #include "sim/event_log.h"
+#include "sim/faults.h"
 #include "sim/model_file.h"
 #include "sim/scenario_file.h"
 #include "sim/sim_platform.h"
@@ -36,10 +37,20 @@ struct Environment {
 // instead. Throws AutomationError when the object cannot be made.
 using AddInFactory = std::function<ObjectPtr()>;
 
+// How the scenario's own objects are made: the add-in's token scanner and a
+// keyed collection. Left empty, in this process (the scanner on the
+// simulation's own module); a COM test host makes the real DLL's scanner and
+// the system's dictionary instead.
+struct ScenarioObjectFactories {
+  std::function<ObjectPtr()> scanner;
+  std::function<ObjectPtr()> dictionary;
+};
+
 class Simulation {
  public:
   // `model` must outlive the simulation.
-  Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn = {});
+  Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn = {},
+             ScenarioObjectFactories makeObjects = {});
   ~Simulation();
   Simulation(const Simulation&) = delete;
   Simulation& operator=(const Simulation&) = delete;
@@ -72,6 +83,8 @@ class Simulation {
  private:
   void Call(const Action& action);
   void SeedRegistry(const std::vector<RegistryEntry>& entries);
+  void MakeObject(const Action& action);
+  void Use(const Action& action);
 
   const ModelDef& model_;
   Environment env_;
@@ -80,6 +93,7 @@ class Simulation {
   VirtualClock clock_;
   SimUserInterface ui_;
   SimObjectFactory factory_;
+  FaultyRegistry faultyRegistry_;  // unrecorded: for finding the debug log
   DebugLogLocator debugLog_;
   RecordingRegistry registry_;
   RecordingFileSystem files_;
@@ -88,7 +102,9 @@ class Simulation {
   platform::Platform platform_;
   Module module_;
   AddInFactory makeAddIn_;
+  ScenarioObjectFactories makeObjects_;
   ObjectPtr api_;
+  ObjectPtr scanner_, dictionary_;
   bool prepared_ = false;
 };
 

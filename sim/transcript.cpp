@@ -121,16 +121,22 @@ std::string TranscriptLine(const EventJson& e) {
   }
   if (ev == "error") return Line("error", Str(e, "member") + " raised " + ErrorText(e) + hostCalls);
   if (ev == "skip") return Line("skip", Str(e, "member") + " (" + Str(e, "reason") + ")");
+  const std::string injected = e.value("fault", false) ? "   [injected]" : "";
   if (ev == "registry-read") {
     const std::string value =
         F(e, "value").is_null() ? "(missing)" : RegistryValueText(F(e, "value")) + " (" + Str(e, "type") + ")";
-    return Line("reg read", RegistryPlace(e) + " = " + value);
+    return Line("reg read", RegistryPlace(e) + " = " + value + injected);
   }
   if (ev == "registry-write")
     return Line("reg write", RegistryPlace(e) + " := " + RegistryValueText(F(e, "value")) + " (" + Str(e, "type") +
                                  ")" + (e.value("written", false) ? "" : " NOT WRITTEN"));
   if (ev == "registry-create")
-    return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition"));
+    return Line("reg key", Str(e, "root") + "\\" + Str(e, "key") + " " + Str(e, "disposition") + injected);
+  if (ev == "fault") {
+    const std::string call = e.contains("call") ? " (call " + Str(e, "call") + ")" : "";
+    return Line("fault", Str(e, "object") + "." + Str(e, "member") + "(" + Args(F(e, "args")) + ")" + call +
+                             " raised " + ErrorText(F(e, "error")));
+  }
   if (ev == "file-exists")
     return Line("file", "exists " + Str(e, "path") + "? " + (e.value("exists", false) ? "yes" : "no"));
   if (ev == "file-delete")
@@ -219,6 +225,7 @@ TranscriptWriter::TranscriptWriter(std::ostream& out, const std::string& title) 
 void TranscriptWriter::Write(const EventJson& e) {
   out_ << TranscriptLine(e) << '\n';
   const std::string ev = Str(e, "ev"), member = Str(e, "member");
+  if (ev == "fault" || e.value("fault", false)) ++faults_;
   if (ev == "call") {
     if (!calls_.count(member)) members_.push_back(member);
     ++calls_[member];
@@ -288,6 +295,7 @@ void TranscriptWriter::Finish() {
                      Plural(companionCalls_, "companion call", "companion calls"));
   row("files", Plural(deletes_, "deleted", "deleted") + ", " + Plural(appends_, "other append", "other appends"));
   row("host log", Plural(hostLog_, "line", "lines"));
+  if (faults_) row("faults", Plural(faults_, "injected failure met", "injected failures met"));
   row("debug log", Plural(debugLines_.size(), "line written", "lines written") +
                        (debugFailed_ ? ", " + Plural(debugFailed_, "write failed", "writes failed") : ""));
   debugLines_.ForEach([&](const std::string& line) { out_ << "    " << line << '\n'; });

@@ -74,7 +74,7 @@ class TranscriptWriter final : public EventSink {
   std::map<std::string, uint64_t> calls_, hostCalls_, errors_;
   SpillList addins_, debugLines_;
   uint64_t regRead_ = 0, regMissing_ = 0, regWritten_ = 0, keysCreated_ = 0, hostLog_ = 0, companionCalls_ = 0,
-           deletes_ = 0, appends_ = 0, objects_ = 0, failedObjects_ = 0, debugFailed_ = 0;
+           deletes_ = 0, appends_ = 0, objects_ = 0, failedObjects_ = 0, debugFailed_ = 0, faults_ = 0;
 };
 
 // All lines, then the summary. `title` heads the text.

@@ -8,7 +8,8 @@
 
 namespace kpx::sim {
 
-World::World(const ModelDef& def, EventLog& log) : def_(def), log_(log), selection_(def.selection) {
+World::World(const ModelDef& def, EventLog& log)
+    : def_(def), log_(log), faults_(def.faults.calls), selection_(def.selection) {
   for (const AddInDef& a : def.addins) addins_.push_back(std::make_shared<AddInObject>(*this, a));
   auto collection = std::make_shared<CollectionObject>(*this, "$app.AddIns",
                                                        std::vector<ObjectPtr>(addins_.begin(), addins_.end()), false);

@@ -12,6 +12,7 @@
 
 #include "automation/variant.h"
 #include "sim/event_log.h"
+#include "sim/faults.h"
 #include "sim/model_file.h"
 
 namespace kpx::sim {
@@ -30,6 +31,8 @@ class World {
 
   EventLog& log() { return log_; }
   const ModelDef& def() const { return def_; }
+  // The host calls the model makes fail.
+  CallFaults& faults() { return faults_; }
 
   ObjectPtr application() const;
   ObjectPtr model() const { return model_; }
@@ -66,6 +69,7 @@ class World {
 
   const ModelDef& def_;
   EventLog& log_;
+  CallFaults faults_;
   std::shared_ptr<ApplicationObject> application_;
   ObjectPtr model_;
   std::vector<std::shared_ptr<ElementObject>> elements_;

@@ -42,6 +42,11 @@ class FakeObject : public Object {
     members_[id] = {std::move(name), std::move(handler)};
     return *this;
   }
+  // Offers `view` as the object seen through interface `iid`.
+  FakeObject& Interface(std::string iid, ObjectPtr view) {
+    interfaces_[std::move(iid)] = std::move(view);
+    return *this;
+  }
   // Makes `id` the n-th operation of the object's own interface.
   FakeObject& Operation(int position, DispId id) {
     operations_[position] = id;
@@ -57,6 +62,11 @@ class FakeObject : public Object {
   DispId IdOfOwnOperation(int position) override {
     auto it = operations_.find(position);
     if (it == operations_.end()) throw AutomationError(vberr::kNoSuchMember);
+    return it->second;
+  }
+  ObjectPtr QueryInterface(std::string_view iid) override {
+    auto it = interfaces_.find(std::string(iid));
+    if (it == interfaces_.end()) throw AutomationError(vberr::kTypeMismatch);
     return it->second;
   }
   Variant Invoke(DispId id, CallKind, std::span<Variant> args) override {
@@ -86,6 +96,7 @@ class FakeObject : public Object {
   Journal* journal_;
   std::map<DispId, Member> members_;
   std::map<int, DispId> operations_;
+  std::map<std::string, ObjectPtr> interfaces_;
 };
 
 // Files in memory. Paths in `failing` refuse every write.

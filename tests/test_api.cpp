@@ -145,7 +145,8 @@ TEST_F(ApiTest, ActivationRunsItsStepsInOrder) {
                            "VC++#1.ReadSetting Events OnUser3 ", "VC++#1.ReadSetting Events OnUser4 ",
                            "VC++#1.ReadSetting Events OnUser5 "}));
   EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnActivate(QuarnApp)\r\n"
-                   " TRACE    ADDIN     kpxAddin.GetLocation(Path, UseDefault)\r\n");
+                   " TRACE    ADDIN     kpxAddin.GetLocation(Path, UseDefault)\r\n"
+                   " TRACE    ADDIN     kpxAddin.QuarnApp()\r\n");
   EXPECT_EQ(api->menuItemKeys().size(), 24u);
   EXPECT_EQ(api->userCommands().at("OnUser2"), "Tools.Count");
 }
@@ -273,6 +274,64 @@ TEST_F(ApiTest, AutomationCallsCheckNamesArgumentsAndUnbuiltMembers) {
   for (size_t i = 0; i < members.size(); ++i) EXPECT_EQ(api->IdOfName(members[i].name), static_cast<DispId>(i + 1));
   EXPECT_STREQ(members[0].name, "OnSelectedContextMenuItem");
   EXPECT_STREQ(members[68].name, "OnDeletedModelElement");
+}
+
+}  // namespace
+}  // namespace kpx
+
+namespace kpx {
+namespace {
+
+// Each public member's first log line: the member's own where it has one,
+// otherwise "kpxAddin.<member>(<parameter names>)". Written before anything
+// can fail, so a member that fails on this bare host still shows it.
+TEST_F(ApiTest, EveryBuiltMemberBeginsWithItsTraceLine) {
+  DebugMask(0x7F000080);
+  FakeHost host(&world.journal, {"VC++"});
+  auto api = CreateApi(module);
+  const std::map<std::string, std::string> own = {
+      {"OnBrowseBody", "kpxAddin.OnBrowseBody(QuarnApp)."},
+      {"OnBrowseHeader", "kpxAddin.OnBrowseHeader(QuarnApp)."},
+      {"OnModelUpdate", "kpxAddin.OnModelUpdate(QuarnApp)."},
+      {"OnModelUpdateSelection", "kpxAddin.OnModelUpdateSelection(QuarnApp)."},
+      {"OnClassWizard", "BEGIN kpxAddin:OnClassWizard"},
+      {"OnLangProperties", "kpxAddin.OnModelUpdateOptions: Calling kpxLangProps."},
+      {"OnUser1", "BEGIN kpxAddin.OnUser1"},
+      {"OnUser2", "BEGIN kpxAddin.OnUser2"},
+      {"OnUser3", "BEGIN kpxAddin.OnUser3"},
+      {"OnUser4", "BEGIN kpxAddin.OnUser4"},
+      {"OnUser5", "BEGIN kpxAddin.OnUser5"}};
+  int checked = 0;
+  for (const ApiMember& m : ApiMembers()) {
+    if (!m.call) continue;  // not built: answers "not implemented" and logs nothing
+    world.files.at("C:\\tzndebuglog.txt").clear();
+    std::vector<Variant> values;
+    for (uint8_t i = 0; i < m.paramCount; ++i) {
+      switch (m.params[i].type) {
+        case ApiType::Object: values.emplace_back(ObjectPtr(host.app)); break;
+        case ApiType::String: values.emplace_back(""); break;
+        case ApiType::Int16: values.emplace_back(int16_t{1}); break;
+        case ApiType::Bool: values.emplace_back(false); break;
+        default: values.emplace_back(int32_t{0});
+      }
+    }
+    std::vector<Variant> args;
+    for (Variant& v : values) args.push_back(Variant::Ref(&v));
+    try {
+      api->Invoke(api->IdOfName(m.name), m.kind, args);
+    } catch (const AutomationError&) {
+      // a bare host makes some members fail after their first line
+    }
+    const std::string log = Log();
+    const std::string first = log.substr(0, log.find("\r\n"));
+    auto it = own.find(m.name);
+    const std::string expected = it != own.end() ? it->second : EntryTraceLine(m.name);
+    EXPECT_EQ(first, std::string(" TRACE    ADDIN     ") + expected) << m.name;
+    ++checked;
+  }
+  EXPECT_GE(checked, 50);
+  EXPECT_EQ(EntryTraceLine("OnEnableContextMenuItems"), "kpxAddin.OnEnableContextMenuItems(QuarnApp, itemType)");
+  EXPECT_EQ(EntryTraceLine("Name"), "kpxAddin.Name()");
 }
 
 }  // namespace

@@ -218,7 +218,9 @@ TEST_F(CommandTest, ForwardingWithoutTheSiblingWritesOneErrorLineEach) {
   EXPECT_EQ(api->OnGenerateCode(a), 0);
   EXPECT_EQ(api->OnComponentAssignment(a), 0);
   EXPECT_EQ(api->OnModelUpdate(a), 0);
-  EXPECT_EQ(Log(), " ERROR    ADDIN     kpxAddin.OnGenerateCode(QuarnApp) failed to get VisualStudio addin.\r\n"
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnGenerateCode(QuarnApp)\r\n"
+                   " ERROR    ADDIN     kpxAddin.OnGenerateCode(QuarnApp) failed to get VisualStudio addin.\r\n"
+                   " TRACE    ADDIN     kpxAddin.OnComponentAssignment(QuarnApp)\r\n"
                    " ERROR    ADDIN     kpxAddin.OnComponentAssignment(QuarnApp) failed to get VisualStudio addin.\r\n"
                    " TRACE    ADDIN     kpxAddin.OnModelUpdate(QuarnApp).\r\n"
                    " ERROR    ADDIN     kpxAddin.StartModelUpdate(QuarnApp) failed to get VisualStudio addin.\r\n");
@@ -249,14 +251,119 @@ TEST_F(CommandTest, FaqRunsScriptsOrObjectsAndFallsBackToTheFaqHelpFile) {
   auto noFaq = std::make_shared<FakeObject>("nofaq", nullptr);
   world.factory.makers["Tools.Faq"] = [&] { return noFaq; };
   settings["OnFAQ"] = "Tools.Faq";
+  world.journal.clear();
   api->OnFAQ(a);
   EXPECT_TRUE(world.ui.help.empty());  // no faq-vc.hlp beside the help file
+  // Nothing to show: the host is not asked for a window to show it in.
+  EXPECT_EQ(std::count(world.journal.begin(), world.journal.end(), "app.GetMainWnd"), 0);
   world.files.at("C:\\Quarn\\Help\\faq-vc.hlp") = "";
   api->OnFAQ(a);
   EXPECT_EQ(world.ui.help, (std::vector<std::string>{"C:\\Quarn\\Help\\faq-vc.hlp"}));
+  EXPECT_EQ(std::count(world.journal.begin(), world.journal.end(), "app.GetMainWnd"), 1);
 
   api->OnHowTo(a);
   EXPECT_EQ(world.ui.help.back(), "C:\\Quarn\\Help\\vc.hlp");
+}
+
+}  // namespace
+}  // namespace kpx
+
+namespace kpx {
+namespace {
+
+// Companions may hand back another host application in the argument they
+// were given by reference; every caller keeps what comes back.
+TEST_F(CommandTest, EveryCallerKeepsTheApplicationACompanionHandsBack) {
+  auto other = std::make_shared<FakeObject>("other app", nullptr);
+  auto handBack = [other](Args a) -> Variant {
+    a[0].assign(Variant(ObjectPtr(other)));
+    return true;
+  };
+  auto pages = std::make_shared<FakeObject>("pages", &world.journal);
+  pages->On(1, "ShowProperties", [other](Args a) -> Variant {
+    EXPECT_EQ(a.size(), 2u);  // the application, then the page
+    EXPECT_EQ(a[1].toInt32(), 3);
+    a[0].assign(Variant(ObjectPtr(other)));
+    return true;
+  });
+  world.factory.makers["{05D99488-AB9F-11D2-B9EB-006008BF3ACB}"] = [pages] { return pages; };
+  auto faq = std::make_shared<FakeObject>("faq", &world.journal);
+  faq->On(1, "OnFAQ", handBack);
+  world.factory.makers["Tools.Faq"] = [faq] { return faq; };
+  auto five = std::make_shared<FakeObject>("five", &world.journal);
+  five->On(1, "OnUser5", handBack);
+  world.factory.makers["Tools.Five"] = [five] { return five; };
+  settings["OnUser5"] = "C|Five|Tools.Five";
+  settings["OnFAQ"] = "Tools.Faq";
+  Activate();
+
+  ObjectPtr a = app;
+  EXPECT_TRUE(api->OnLangProperties(a, Variant(3)).toBool());
+  EXPECT_EQ(a, other);
+  a = app;
+  api->OnFAQ(a);
+  EXPECT_EQ(a, other);
+  EXPECT_TRUE(world.ui.help.empty());  // handled: no help file
+  // The fifth slot is reached from its menu entry like the others.
+  a = app;
+  std::string entry = "UClass_OnUser5";
+  api->OnSelectedContextMenuItem(a, entry);
+  EXPECT_EQ(a, other);
+  EXPECT_EQ(five->calls, 1);
+  EXPECT_NE(Log().find("  END OnUser5()  OK"), std::string::npos);
+}
+
+TEST_F(CommandTest, AFailingClassWizardIsLoggedAsCritical) {
+  auto wizard = std::make_shared<FakeObject>("wizard", &world.journal);
+  wizard->On(1, "StartClassWizard", [](Args) -> Variant { throw AutomationError(5, "no project"); });
+  world.factory.makers["tznclwiz.api"] = [wizard] { return wizard; };
+  Activate();
+  ObjectPtr a = app;
+  EXPECT_EQ(api->OnClassWizard(a), 0);
+  EXPECT_EQ(Log(), " TRACE    ADDIN     BEGIN kpxAddin:OnClassWizard\r\n"
+                   " CRITICAL ADDIN     ERROR kpxAddin:OnClassWizard: Call to CW failed: no project\r\n");
+}
+
+// The importer takes the host application through its holder interface,
+// never by a name on its default interface.
+TEST_F(CommandTest, TheTypeLibraryImporterIsHandedTheApplicationThroughItsHolderInterface) {
+  auto importer = std::make_shared<FakeObject>("importer", &world.journal);
+  auto holder = std::make_shared<FakeObject>("holder", &world.journal);
+  importer->On(1, "QuarnApp", nullptr);  // a decoy on the default interface
+  holder->On(7, "QuarnApp", nullptr);
+  importer->Interface("{DDA8932A-8C47-11D3-813D-00A0C938B875}", holder);
+  world.factory.makers["{B025E5DB-4064-11D3-B9F7-006008BF3ACB}"] = [importer] { return importer; };
+  Activate();
+  EXPECT_EQ(api->TypeLibImporter(), importer);
+  EXPECT_EQ(world.journal, (test::Journal{"holder.QuarnApp <obj>"}));
+  EXPECT_EQ(api->TypeLibImporter(), importer);  // made once
+  EXPECT_EQ(holder->calls, 1);
+
+  // An importer without the interface is kept, and the failure logged.
+  api = nullptr;
+  auto bare = std::make_shared<FakeObject>("bare", &world.journal);
+  world.factory.makers["{B025E5DB-4064-11D3-B9F7-006008BF3ACB}"] = [bare] { return bare; };
+  Activate();
+  EXPECT_EQ(api->TypeLibImporter(), bare);
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.TypeLibImporter()\r\n"
+                   " ERROR    ADDIN     kpxAddin.Get TypeLibImporter(): Type mismatch\r\n");
+}
+
+TEST_F(CommandTest, CodeUpdateEventsClearThePendingErrorAndAnswerZero) {
+  Activate();
+  ObjectPtr a = app;
+  for (const char* member : {"OnCodeUpdateStart", "OnCodeUpdateEnd"}) {
+    module.error() = {75, "Path/File access error"};
+    Variant byRef(a);
+    std::vector<Variant> args{Variant::Ref(&byRef)};
+    EXPECT_EQ(api->Invoke(api->IdOfName(member), CallKind::Method, args).toInt32(), 0) << member;
+    EXPECT_EQ(module.error().number, 0) << member;
+    EXPECT_EQ(module.error().description, "") << member;
+  }
+  module.error() = {75, "Path/File access error"};
+  EXPECT_EQ(api->OnModelUpdateStart(a), 0);
+  EXPECT_EQ(api->OnModelUpdateEnd(a), 0);
+  EXPECT_EQ(module.error().number, 75);  // the model-update events leave it
 }
 
 }  // namespace

@@ -339,6 +339,25 @@ TEST(SandboxFileSystem, MapsWindowsPathsIntoTheSandbox) {
   EXPECT_FALSE(fs::exists(sb / "C" / "Logs" / "tzndebuglog.txt"));
 }
 
+TEST(SandboxFileSystem, APathEndsAtItsFirstNulAsForTheWindowsApi) {
+  using namespace std::string_literals;
+  TempDir dir;
+  const fs::path& sb = dir.path();
+  SandboxFileSystem files(sb);
+  fs::create_directories(sb / "C" / "Logs");
+  WriteFile(sb / "C" / "Logs" / "tzndebuglog.txt", "one\n");
+
+  EXPECT_EQ(files.HostPath("C:\\LOGS\0\\..\\x"s), sb / "C" / "Logs");
+  ASSERT_TRUE(files.AppendText("C:\\LOGS\\TZNDEBUGLOG.TXT\0junk"s, "two\n"));
+  EXPECT_EQ(ReadFile(sb / "C" / "Logs" / "tzndebuglog.txt"), "one\ntwo\n");
+  EXPECT_EQ(std::distance(fs::directory_iterator(sb / "C" / "Logs"), fs::directory_iterator()), 1)
+      << "what follows the NUL must not keep the case-blind lookup from finding the file";
+  EXPECT_FALSE(files.Exists("\0C:\\Logs"s));
+  EXPECT_FALSE(files.AppendText("C:\\Logs\\\0name.txt"s, "x")) << "names the folder";
+  EXPECT_TRUE(files.DeleteFile("c:\\logs\\TznDebugLog.txt\0.bak"s));
+  EXPECT_FALSE(fs::exists(sb / "C" / "Logs" / "tzndebuglog.txt"));
+}
+
 TEST(SandboxFileSystem, FailsWhereWindowsFails) {
   TempDir dir;
   const fs::path& sb = dir.path();

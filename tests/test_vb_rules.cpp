@@ -30,6 +30,17 @@ TEST(VariantConversion, TextConvertsOnlyWhenAllOfItIsANumber) {
   EXPECT_EQ(ErrorNumberOf([] { Variant(5).toObject(); }), vberr::kObjectRequired);
 }
 
+TEST(VariantConversion, TextBeyondTheRangeOverflowsAndCsNumberFormsAreNotNumbers) {
+  EXPECT_EQ(ErrorNumberOf([] { Variant("1e400").toDouble(); }), vberr::kOverflow);
+  EXPECT_EQ(ErrorNumberOf([] { Variant("-1.8E+308").toInt32(); }), vberr::kOverflow);
+  EXPECT_EQ(ErrorNumberOf([] { Variant("&H100000000").toInt32(); }), vberr::kOverflow);
+  EXPECT_EQ(Variant("1e-400").toDouble(), 0);  // too small to hold is 0, not an error
+  for (const char* text : {"inf", "-Infinity", "nan", "0x1A", "0x1p4", "&H+1", "&H-1", "&H 1", "&H0x1", "1e", "."})
+    EXPECT_EQ(ErrorNumberOf([&] { Variant(text).toDouble(); }), vberr::kTypeMismatch) << text;
+  EXPECT_EQ(ErrorNumberOf([] { Variant("nan").toInt32(); }), vberr::kTypeMismatch);
+  EXPECT_EQ(Variant("\t-.5E1 ").toDouble(), -5);
+}
+
 TEST(VariantConversion, EmptyReadsAsZeroBlankAndFalse) {
   Variant empty;
   EXPECT_EQ(empty.toInt32(), 0);
@@ -76,6 +87,9 @@ TEST(VbStrings, ValReadsTheLeadingNumber) {
   EXPECT_EQ(Val("-1.5e2x"), -150);
   EXPECT_EQ(Val("abc"), 0);
   EXPECT_EQ(Val("&H10"), 16);
+  EXPECT_EQ(Val("1e"), 1);
+  EXPECT_EQ(Val("1e-400x"), 0);
+  EXPECT_EQ(ErrorNumberOf([] { Val("1e400"); }), vberr::kOverflow);
 }
 
 TEST(VbStrings, SinglePrecisionTextHasSevenSignificantDigits) {

@@ -61,7 +61,7 @@ std::vector<std::wstring> AddInKeys() {
   return {L"CLSID\\" + Guid(CLSID_API),           L"CLSID\\" + Guid(CLSID_TokenScanner),
           L"kpxAddIn.API",                        L"kpxAddIn.TokenScanner",
           L"TypeLib\\" + Guid(LIBID_kpxAddIn),    L"Interface\\" + Guid(DIID__API),
-          L"Interface\\" + Guid(DIID__TokenScanner), L"Interface\\" + Guid(DIID__Delimiters)};
+          L"Interface\\" + Guid(DIID__TokenScanner)};
 }
 
 std::vector<std::wstring> ResourceKeys() {
@@ -466,37 +466,55 @@ void TokenScannerThroughIDispatch() {
   CHECK(Call(scanner.get(), IdOf(scanner.get(), L"CurrentToken"), Flags::Get).result.Text() == L"b");
   CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"c");
 
-  // The delimiter set: a live keyed collection.
+  // The delimiter set is a Scripting Runtime dictionary, live both ways.
   const DISPID delimitors = IdOf(scanner.get(), L"Delimitors");
   Outcome set = Call(scanner.get(), delimitors, Flags::Get);
   CHECK_EQ(set.result.v.vt, VT_DISPATCH);
   if (set.result.v.vt != VT_DISPATCH || !set.result.v.pdispVal) return;
   IDispatch* keys = set.result.v.pdispVal;
   CHECK_EQ(Call(keys, IdOf(keys, L"Count"), Flags::Get).result.v.lVal, 1L);
-  Var commaKey = Var::Str(L","), semiKey = Var::Str(L";");
+  CHECK_EQ(Call(keys, IdOf(keys, L"CompareMode"), Flags::Get).result.v.lVal, 0L);  // binary
+  Var commaKey = Var::Str(L","), semiKey = Var::Str(L";"), nothing = Var::Str(L"");
   CHECK_EQ(Call(keys, IdOf(keys, L"Exists"), Flags::Method, {&commaKey}).result.v.boolVal, VARIANT_TRUE);
-  CHECK_HR(Call(keys, IdOf(keys, L"Add"), Flags::Method, {&semiKey}).hr, S_OK);
-  Outcome duplicate = Call(keys, IdOf(keys, L"Add"), Flags::Method, {&semiKey});
-  CHECK_HR(duplicate.info.scode, VbError(457));
-  Var mixed = Var::Str(L"p;q,r");
-  Call(scanner.get(), scan, Flags::Put, {&mixed});
-  // Init would replace the set; rescanning from a fresh ScanString goes on
-  // from the old position, so a second scanner checks the new set instead.
-  Ref<IDispatch> other = Create(L"kpxAddIn.TokenScanner");
-  CHECK(other);
-  if (other) {
-    Var setArg = Var::Disp(keys);
-    CHECK_HR(Call(other.get(), delimitors, Flags::PutRef, {&setArg}).hr, S_OK);
-    Var pqr = Var::Str(L"p;q,r");
-    CHECK_HR(Call(other.get(), scan, Flags::Put, {&pqr}).hr, S_OK);
-    CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"p");
-    CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"q");
-    // A foreign object is no delimiter set.
-    Ref<HostObject> foreign = HostObject::Make(L"dictionary");
-    Var foreignArg = Var::Disp(foreign.get());
-    Outcome refused = Call(other.get(), delimitors, Flags::PutRef, {&foreignArg});
-    CHECK_HR(refused.hr, DISP_E_EXCEPTION);
-    CHECK_HR(refused.info.scode, VbError(13));
+  CHECK_HR(Call(keys, IdOf(keys, L"Add"), Flags::Method, {&semiKey, &nothing}).hr, S_OK);
+  Var mixed = Var::Str(L"p;q,r"), scanComma = Var::Str(L"|,");
+  Call(scanner.get(), init, Flags::Method, {&mixed, &scanComma});  // a fresh set of its own
+  CHECK(Call(scanner.get(), next, Flags::Method).result.Text() == L"p;q");
+
+  // A dictionary the caller made: the scanner asks it about every
+  // character, so what the caller changes afterwards counts at once.
+  Ref<IDispatch> dictionary = Create(L"Scripting.Dictionary");
+  CHECK(dictionary);
+  if (dictionary) {
+    Var lowerX = Var::Str(L"x");
+    CHECK_HR(Call(dictionary.get(), IdOf(dictionary.get(), L"Add"), Flags::Method, {&semiKey, &nothing}).hr, S_OK);
+    CHECK_HR(Call(dictionary.get(), IdOf(dictionary.get(), L"Add"), Flags::Method, {&lowerX, &nothing}).hr, S_OK);
+    Var setArg = Var::Disp(dictionary.get());
+    CHECK_HR(Call(scanner.get(), delimitors, Flags::PutRef, {&setArg}).hr, S_OK);
+    // Init would replace the set: a fresh scanner is given the text instead.
+    Var scanText = Var::Str(L"p;qXr,sxt,u");
+    Ref<IDispatch> other = Create(L"kpxAddIn.TokenScanner");
+    CHECK(other);
+    if (other) {
+      CHECK_HR(Call(other.get(), delimitors, Flags::PutRef, {&setArg}).hr, S_OK);
+      CHECK_HR(Call(other.get(), scan, Flags::Put, {&scanText}).hr, S_OK);
+      CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"p");
+      CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"qXr,s");  // keys compare case-sensitively
+      Var xKey = Var::Str(L"x"), commaArg = Var::Str(L",");
+      CHECK_HR(Call(dictionary.get(), IdOf(dictionary.get(), L"Remove"), Flags::Method, {&xKey}).hr, S_OK);
+      CHECK_HR(Call(dictionary.get(), IdOf(dictionary.get(), L"Add"), Flags::Method, {&commaArg, &nothing}).hr, S_OK);
+      CHECK_HR(Call(other.get(), scan, Flags::Put, {&scanText}).hr, S_OK);
+      CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"t");  // "," is a delimiter now
+      CHECK(Call(other.get(), next, Flags::Method).result.Text() == L"u");
+      Outcome given = Call(other.get(), delimitors, Flags::Get);
+      CHECK(given.result.v.vt == VT_DISPATCH && given.result.v.pdispVal == dictionary.get());
+      // An object that is no dictionary is refused, and the set stays.
+      Ref<HostObject> foreign = HostObject::Make(L"dictionary");
+      Var foreignArg = Var::Disp(foreign.get());
+      Outcome refused = Call(other.get(), delimitors, Flags::PutRef, {&foreignArg});
+      CHECK_HR(refused.hr, DISP_E_EXCEPTION);
+      CHECK_HR(refused.info.scode, VbError(13));
+    }
   }
 }
 
@@ -713,9 +731,11 @@ void ReferencesAndUnloading(HMODULE addin) {
     CHECK(api && scanner);
     CHECK_HR(canUnload(), S_FALSE);
     Outcome set = Call(scanner.get(), IdOf(scanner.get(), L"Delimitors"), Flags::Get);
+    CHECK_EQ(set.result.v.vt, VT_DISPATCH);
     api.reset();
     scanner.reset();
-    CHECK_HR(canUnload(), S_FALSE);  // the delimiter set is still held
+    // The delimiter set still held is the Scripting Runtime's, not the add-in's.
+    CHECK_HR(canUnload(), S_OK);
   }
   CoFreeUnusedLibraries();
   CHECK_HR(canUnload(), S_OK);

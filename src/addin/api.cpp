@@ -23,6 +23,7 @@ constexpr std::string_view kCompPropertiesClassId = "{CFD996E3-1393-11D3-B9F3-00
 constexpr std::string_view kCompPropertiesInterfaceId = "{12116B22-E8D1-11D3-91B1-00104B217705}";
 constexpr std::string_view kTypeLibImporterClassId = "{B025E5DB-4064-11D3-B9F7-006008BF3ACB}";
 constexpr std::string_view kTypeLibImporterInterfaceId = "{BC821C51-9E3C-11D3-8159-00A0C938B875}";
+constexpr std::string_view kHostApplicationHolderInterfaceId = "{DDA8932A-8C47-11D3-813D-00A0C938B875}";
 
 }  // namespace
 
@@ -81,9 +82,64 @@ Variant API::Invoke(DispId id, CallKind kind, std::span<Variant> args) {
 
 // --------------------------------------------------------- identity, factories
 
-int32_t API::OnDefaultLangProperties(ObjectPtr&) { return 0; }
+void API::TraceEntry(std::string_view member) {
+  // The line is built only when it will be written.
+  if (module_.logger().DebugLogEnabled(logid::ADDIN, loglevel::TRACE))
+    module_.DebugLog(EntryTraceLine(member), logid::ADDIN, loglevel::TRACE);
+}
+
+std::string API::Name() {
+  TraceEntry("Name");
+  return "VC++";
+}
+
+ObjectPtr API::QuarnApp() {
+  TraceEntry("QuarnApp");
+  return theQuarnApp_;
+}
+
+int32_t API::OnDefaultLangProperties(ObjectPtr&) {
+  TraceEntry("OnDefaultLangProperties");
+  return 0;
+}
+
+// Dropped files are not accepted.
+int32_t API::CanDropFileOnDiagram() {
+  TraceEntry("CanDropFileOnDiagram");
+  return 0;
+}
+int32_t API::CanDropFileOnItem() {
+  TraceEntry("CanDropFileOnItem");
+  return 0;
+}
+int32_t API::DropFileOnDiagram() {
+  TraceEntry("DropFileOnDiagram");
+  return 0;
+}
+int32_t API::DropFileOnItem() {
+  TraceEntry("DropFileOnItem");
+  return 0;
+}
+
+bool API::IsLanguageOperational() {
+  TraceEntry("IsLanguageOperational");
+  return true;
+}
+std::string API::LanguageName() {
+  TraceEntry("LanguageName");
+  return "VC++";
+}
+std::string API::LanguageInfo() {
+  TraceEntry("LanguageInfo");
+  return "Microsoft Visual C++";
+}
+int32_t API::LanguageId() {
+  TraceEntry("LanguageId");
+  return 0;
+}
 
 ObjectPtr API::LangPropertiesAPI() {
+  TraceEntry("LangPropertiesAPI");
   ResumeNext onError;
   if (!theLangPropertiesAPI_) {
     onError([&] {
@@ -97,6 +153,7 @@ ObjectPtr API::LangPropertiesAPI() {
 }
 
 ObjectPtr API::CompPropertiesAPI() {
+  TraceEntry("CompPropertiesAPI");
   ResumeNext onError;
   if (!theCompPropertiesAPI_)
     onError([&] {
@@ -107,16 +164,23 @@ ObjectPtr API::CompPropertiesAPI() {
 }
 
 ObjectPtr API::TypeLibImporter() {
+  TraceEntry("TypeLibImporter");
   ResumeNext onError;
   if (!theTypeLibImporter_) {
     onError([&] {
       theTypeLibImporter_ =
           module_.platform().objects.CreateInstance(kTypeLibImporterClassId, kTypeLibImporterInterfaceId);
     });
-    // The importer's host-application property; its interface names it "QuarnApp".
-    onError([&] {
-      CallByName(theTypeLibImporter_, "QuarnApp", CallKind::PropertyPutRef, {Variant(theQuarnApp_)});
-    });
+    // The importer is handed the host application through an interface of
+    // its own, not its default one: its "QuarnApp" property there.
+    if (theTypeLibImporter_) {
+      onError([&] {
+        ObjectPtr holder = theTypeLibImporter_->QueryInterface(kHostApplicationHolderInterfaceId);
+        CallByName(holder, "QuarnApp", CallKind::PropertyPutRef, {Variant(theQuarnApp_)});
+      });
+    }
+    if (onError.failed())
+      module_.DebugLog("kpxAddin.Get TypeLibImporter(): " + onError.description(), logid::ADDIN, loglevel::ERROR);
   }
   return theTypeLibImporter_;
 }
@@ -175,6 +239,36 @@ int32_t API::OnDeactivate(ObjectPtr&) {
 
 int32_t API::OnAppInit(ObjectPtr&) {
   module_.DebugLog("kpxAddin.OnAppInit(QuarnApp)", logid::ADDIN, loglevel::TRACE);
+  return 0;
+}
+
+int32_t API::OnNewModel(ObjectPtr&) {
+  TraceEntry("OnNewModel");
+  return 0;
+}
+
+// The host brackets every code generation and model update with these. The
+// project settings of the model's components are not refreshed here yet:
+// that belongs with the component set-up the add-in does not offer so far.
+int32_t API::OnCodeUpdateStart(ObjectPtr&) {
+  TraceEntry("OnCodeUpdateStart");
+  module_.error().Clear();
+  return 0;
+}
+
+int32_t API::OnCodeUpdateEnd(ObjectPtr&) {
+  TraceEntry("OnCodeUpdateEnd");
+  module_.error().Clear();
+  return 0;
+}
+
+int32_t API::OnModelUpdateStart(ObjectPtr&) {
+  TraceEntry("OnModelUpdateStart");
+  return 0;
+}
+
+int32_t API::OnModelUpdateEnd(ObjectPtr&) {
+  TraceEntry("OnModelUpdateEnd");
   return 0;
 }
 

@@ -58,17 +58,17 @@ class API final : public Object {
   Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
 
   // Identity and factories.
-  std::string Name() const { return "VC++"; }
-  ObjectPtr QuarnApp() const { return theQuarnApp_; }
+  std::string Name();
+  ObjectPtr QuarnApp();
   ObjectPtr LangPropertiesAPI();
   ObjectPtr CompPropertiesAPI();
   ObjectPtr TypeLibImporter();
   int32_t OnDefaultLangProperties(ObjectPtr& QuarnApp);
   // Dropped files are not accepted.
-  int32_t CanDropFileOnDiagram() { return 0; }
-  int32_t CanDropFileOnItem() { return 0; }
-  int32_t DropFileOnDiagram() { return 0; }
-  int32_t DropFileOnItem() { return 0; }
+  int32_t CanDropFileOnDiagram();
+  int32_t CanDropFileOnItem();
+  int32_t DropFileOnDiagram();
+  int32_t DropFileOnItem();
 
   // Activation.
   int32_t OnActivate(ObjectPtr& QuarnApp);
@@ -110,11 +110,18 @@ class API final : public Object {
   int32_t OnFAQ(ObjectPtr& QuarnApp);
 
   // Language identity.
-  bool IsLanguageOperational() const { return true; }
-  std::string LanguageName() const { return "VC++"; }
-  std::string LanguageInfo() const { return "Microsoft Visual C++"; }
-  int32_t LanguageId() const { return 0; }
+  bool IsLanguageOperational();
+  std::string LanguageName();
+  std::string LanguageInfo();
+  int32_t LanguageId();
   std::string GetLocation(const std::string& path, bool useDefault);
+
+  // Host events around code generation and model update, and a new model.
+  int32_t OnNewModel(ObjectPtr& QuarnApp);
+  int32_t OnCodeUpdateStart(ObjectPtr& QuarnApp);
+  int32_t OnCodeUpdateEnd(ObjectPtr& QuarnApp);
+  int32_t OnModelUpdateStart(ObjectPtr& QuarnApp);
+  int32_t OnModelUpdateEnd(ObjectPtr& QuarnApp);
 
   const std::string& menuText(MenuText which) const { return menuTexts_[static_cast<size_t>(which)]; }
   // The menu entries the host returned, by key, as the last build left them.
@@ -123,6 +130,9 @@ class API final : public Object {
   const std::map<std::string, std::string, NoCaseLess>& userCommands() const { return UserCommands_; }
 
  private:
+  // The first line of a public member that has no first line of its own:
+  // "kpxAddin.<member>(<parameter names>)" at TRACE.
+  void TraceEntry(std::string_view member);
   void ReleaseObjects();
   bool RegisterIDEAddIn(const ObjectPtr& QuarnApp);
   bool BuildContextMenus(const ObjectPtr& QuarnApp, const ObjectPtr& addIn);

@@ -109,7 +109,7 @@ const std::array<ApiMember, kApiMemberCount> kMembers = {{
     Cmd("OnModelUpdate", [](API& a, Args x) -> Variant { return a.OnModelUpdate(ObjectArg(x[0])); }),
     Cmd("OnModelUpdateSelection", [](API& a, Args x) -> Variant { return a.OnModelUpdateSelection(ObjectArg(x[0])); }),
     Cmd("OnComponentAssignment", [](API& a, Args x) -> Variant { return a.OnComponentAssignment(ObjectArg(x[0])); }),
-    Cmd("OnNewModel", [](API&, Args) -> Variant { return 0; }),
+    Cmd("OnNewModel", [](API& a, Args x) -> Variant { return a.OnNewModel(ObjectArg(x[0])); }),
     G("CodeIcons", T::Object),
     G("LargeCodeIcons", T::Object),
     G("LanguageId", T::Int32, [](API& a, Args) -> Variant { return a.LanguageId(); }),
@@ -144,10 +144,10 @@ const std::array<ApiMember, kApiMemberCount> kMembers = {{
     Cmd("OnImplementInterfaces", [](API& a, Args x) -> Variant { return a.OnImplementInterfaces(ObjectArg(x[0])); }),
     Cmd("OnModuleDependencyProperties"),
     Cmd("OnExposeProperty", [](API& a, Args x) -> Variant { return a.OnExposeProperty(ObjectArg(x[0])); }),
-    Cmd("OnCodeUpdateStart"),
-    Cmd("OnCodeUpdateEnd", [](API&, Args) -> Variant { return 0; }),
-    Cmd("OnModelUpdateStart"),
-    Cmd("OnModelUpdateEnd", [](API&, Args) -> Variant { return 0; }),
+    Cmd("OnCodeUpdateStart", [](API& a, Args x) -> Variant { return a.OnCodeUpdateStart(ObjectArg(x[0])); }),
+    Cmd("OnCodeUpdateEnd", [](API& a, Args x) -> Variant { return a.OnCodeUpdateEnd(ObjectArg(x[0])); }),
+    Cmd("OnModelUpdateStart", [](API& a, Args x) -> Variant { return a.OnModelUpdateStart(ObjectArg(x[0])); }),
+    Cmd("OnModelUpdateEnd", [](API& a, Args x) -> Variant { return a.OnModelUpdateEnd(ObjectArg(x[0])); }),
     Cmd("OnAssignClasses"),
     Cmd("OnImportATL"),
     M("RenderClass", T::Int32, {App, Obj("aClass"), None, None}, 2),
@@ -160,5 +160,21 @@ const std::array<ApiMember, kApiMemberCount> kMembers = {{
 }  // namespace
 
 std::span<const ApiMember> ApiMembers() { return kMembers; }
+
+std::string EntryTraceLine(std::string_view member) {
+  std::string line = "kpxAddin.";
+  line += member;
+  line += '(';
+  for (const ApiMember& m : kMembers) {
+    if (member != m.name) continue;
+    for (uint8_t i = 0; i < m.paramCount; ++i) {
+      if (i) line += ", ";
+      line += m.params[i].name;
+    }
+    break;
+  }
+  line += ')';
+  return line;
+}
 
 }  // namespace kpx

@@ -6,6 +6,8 @@
 #include <array>
 #include <cstdint>
 #include <span>
+#include <string>
+#include <string_view>
 
 #include "automation/object.h"
 
@@ -34,6 +36,9 @@ struct ApiMember {
 };
 
 std::span<const ApiMember> ApiMembers();
+// "kpxAddin.<member>(<parameter names>)": the trace line a member without a
+// first line of its own begins with.
+std::string EntryTraceLine(std::string_view member);
 inline constexpr int kApiMemberCount = 69;
 
 }  // namespace kpx

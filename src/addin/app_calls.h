@@ -8,9 +8,10 @@
 
 namespace kpx {
 
-// Calls `member` by name with `leading` arguments and then the host
-// application by reference, and stores the application the callee left.
+// Calls `member` by name with `leading` arguments, the host application by
+// reference and `trailing` arguments, and stores the application the callee
+// left.
 Variant CallWithApp(const ObjectPtr& object, std::string_view member, ObjectPtr& QuarnApp,
-                    std::initializer_list<Variant> leading = {});
+                    std::initializer_list<Variant> leading = {}, std::initializer_list<Variant> trailing = {});
 
 }  // namespace kpx

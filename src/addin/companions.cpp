@@ -19,6 +19,7 @@ constexpr int32_t kMsgNoClassSelectedTitle = 5056;
 }  // namespace
 
 ObjectPtr API::ModelAssistantAPI() {
+  TraceEntry("ModelAssistantAPI");
   ResumeNext onError;
   if (!theModelAssistantAPI_) {
     onError([&] { theModelAssistantAPI_ = module_.platform().objects.CreateObject("kpxModelAssist.API"); });
@@ -30,6 +31,7 @@ ObjectPtr API::ModelAssistantAPI() {
 }
 
 int32_t API::OnModelAssistant(ObjectPtr& QuarnApp) {
+  TraceEntry("OnModelAssistant");
   const std::string prefix = "kpxAddin:OnModelAssistant(QuarnApp):";
   return CatchAll(
       [&] {
@@ -56,6 +58,7 @@ int32_t API::OnModelAssistant(ObjectPtr& QuarnApp) {
 // A component made anew for each call; a failing member is not passed on.
 int32_t API::LaunchCompanion(ObjectPtr& QuarnApp, const char* progId, const char* member, const char* traceName,
                              const char* prefix) {
+  TraceEntry(traceName);
   ResumeNext onError;
   ObjectPtr component;
   onError([&] { component = module_.platform().objects.CreateObject(progId); });
@@ -97,6 +100,7 @@ int32_t API::OnClassWizard(ObjectPtr& QuarnApp) {
 }
 
 ObjectPtr API::StatementGenerator() {
+  TraceEntry("StatementGenerator");
   ResumeNext onError;
   if (!theStatementGenerator_) {
     onError([&] {
@@ -139,11 +143,7 @@ Variant API::OnLangProperties(ObjectPtr& QuarnApp, const Variant& lPage) {
       [&] {
         module_.DebugLog("kpxAddin.OnModelUpdateOptions: Calling kpxLangProps.", logid::ADDIN, loglevel::TRACE);
         Variant page(lPage.isEmpty() ? Variant(0) : lPage.deref());
-        // The page number follows the application here, so the shared helper does not fit.
-        Variant app(QuarnApp);
-        Variant answer = CallByName(LangPropertiesAPI(), "ShowProperties", CallKind::Method, {Variant::Ref(&app), page});
-        QuarnApp = app.toObject();
-        return answer;
+        return CallWithApp(LangPropertiesAPI(), "ShowProperties", QuarnApp, {}, {page});
       },
       [&](const AutomationError& e) {
         module_.DebugLog("kpxAddin.OnModelUpdateOptions: Call failed. " + e.description(), logid::ADDIN,

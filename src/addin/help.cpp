@@ -3,6 +3,7 @@
 #include <string>
 
 #include "addin/api.h"
+#include "addin/app_calls.h"
 #include "addin/find_addin.h"
 #include "automation/error_styles.h"
 #include "automation/vb_strings.h"
@@ -43,24 +44,21 @@ int32_t API::OnFAQ(ObjectPtr& QuarnApp) {
   bool handled = false;
   if (!setting.empty()) {
     if (!EqualsNoCase(Right(setting, 4), ".ebs")) {
-      handled = onError([&] {
-        ObjectPtr faq = module_.platform().objects.CreateObject(setting);
-        Variant app(QuarnApp);
-        CallByName(faq, "OnFAQ", CallKind::Method, {Variant::Ref(&app)});
-      });
+      handled = onError([&] { CallWithApp(module_.platform().objects.CreateObject(setting), "OnFAQ", QuarnApp); });
     } else {
       handled = onError([&] { CallMethod(QuarnApp, hostid::kExecuteScript, {Variant(setting)}); });
     }
   }
   if (handled) return 0;
 
-  int64_t window = 0;
   std::string helpFile;
-  onError([&] { window = MainWindow(QuarnApp); });
   onError([&] { helpFile = GetProperty(addIn, hostid::kHelpFile).toString(); });
   const std::string faqFile = DirectoryOf(helpFile) + "faq-vc.hlp";
-  if (FileExists(module_.platform().files, faqFile))
-    onError([&] { module_.platform().ui.WinHelp(window, faqFile, platform::kHelpFinder, 0); });
+  if (!FileExists(module_.platform().files, faqFile)) return 0;
+  // The main window is asked for only when there is a help window to own.
+  int64_t window = 0;
+  onError([&] { window = MainWindow(QuarnApp); });
+  onError([&] { module_.platform().ui.WinHelp(window, faqFile, platform::kHelpFinder, 0); });
   return 0;
 }
 

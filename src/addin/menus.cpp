@@ -128,6 +128,7 @@ bool API::CheckComponent(const ObjectPtr& component) {
 }
 
 Variant API::ValidateComponent(const ObjectPtr& item, int16_t& count, bool& hasVC, bool& failed) {
+  TraceEntry("ValidateComponent");
   const std::string kind = CallMethod(item, hostid::kIdentifyClass).toString();
   ObjectPtr single;      // a component judged by itself
   ObjectPtr candidates;  // or the components a class is assigned to

@@ -23,6 +23,7 @@ int32_t Swallow(const AutomationError&) { return 0; }
 }  // namespace
 
 int32_t API::ForwardToVisualStudio(ObjectPtr& QuarnApp, const char* event) {
+  TraceEntry(event);
   return CatchAll(
       [&] {
         ObjectPtr addIn = FindAddIn(QuarnApp, "VisualStudio");

@@ -1,6 +1,8 @@
 // Up to five context-menu commands the user defines in the add-in's "Events"
 // settings, as "types|caption|ProgID": choosing one creates that automation
 // object and calls its method named after the slot.
+#include "addin/user_commands.h"
+
 #include <string>
 
 #include "addin/api.h"
@@ -13,8 +15,6 @@ namespace kpx {
 namespace {
 
 constexpr int kSlots = 5;
-// Used when a definition names no object; creating it fails and says so.
-constexpr const char* kPlaceholderProgId = "KORVA";
 
 struct UserMenuType {
   char letter;
@@ -28,16 +28,12 @@ constexpr UserMenuType kUserMenuTypes[] = {
     {'O', hostid::kItemOperation, "UOperation_"},
 };
 
-struct UserCommandDefinition {
-  std::string types;  // not trimmed
-  std::string caption;
-  std::string progId;
-};
+}  // namespace
 
-UserCommandDefinition ParseDefinition(const std::string& slot, const std::string& text) {
+UserCommandDefinition SplitUserCommandDefinition(std::string_view slot, std::string_view text) {
   const size_t first = InStr(text, "|");
-  if (first == 0) return {text, slot, ""};
-  UserCommandDefinition d{Left(text, first - 1), {}, kPlaceholderProgId};
+  if (first == 0) return {std::string(text), std::string(slot), ""};
+  UserCommandDefinition d{Left(text, first - 1), {}, std::string(kPlaceholderProgId)};
   const std::string rest = Mid(text, first + 1);
   const size_t second = InStr(rest, "|");
   if (second == 0) {
@@ -50,8 +46,6 @@ UserCommandDefinition ParseDefinition(const std::string& slot, const std::string
   return d;
 }
 
-}  // namespace
-
 bool API::BuildUserCommandMenus(const ObjectPtr&, const ObjectPtr& addIn) {
   bool separatorAdded[std::size(kUserMenuTypes)] = {};
   UserCommands_.clear();
@@ -62,7 +56,7 @@ bool API::BuildUserCommandMenus(const ObjectPtr&, const ObjectPtr& addIn) {
           const std::string text =
               Trim(CallMethod(addIn, hostid::kReadSetting, {Variant("Events"), Variant(slot), Variant("")}).toString());
           if (text.empty()) continue;
-          const UserCommandDefinition d = ParseDefinition(slot, text);
+          const UserCommandDefinition d = SplitUserCommandDefinition(slot, text);
           UserCommands_[slot] = d.progId;
           const std::string types = UCase(d.types);
           for (size_t t = 0; t < std::size(kUserMenuTypes); ++t) {

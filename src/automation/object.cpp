@@ -6,6 +6,8 @@ namespace kpx {
 
 DispId Object::IdOfOwnOperation(int) { throw AutomationError(vberr::kNoSuchMember); }
 
+ObjectPtr Object::QueryInterface(std::string_view) { throw AutomationError(vberr::kTypeMismatch); }
+
 Variant Invoke(const ObjectPtr& obj, DispId id, CallKind kind, std::span<Variant> args) {
   if (!obj) throw AutomationError(vberr::kObjectNotSet);
   return obj->Invoke(id, kind, args);

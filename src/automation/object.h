@@ -37,6 +37,12 @@ class Object {
   // sometimes addressed this way. Raises 438 when there is no such operation.
   virtual DispId IdOfOwnOperation(int position);
 
+  // The object seen through another of its interfaces (an id in registry
+  // form, "{XXXXXXXX-...}"), as a variable declared with that interface
+  // holds it: its names and own operations are that interface's. Raises 13
+  // (type mismatch) when the object does not offer the interface.
+  virtual ObjectPtr QueryInterface(std::string_view iid);
+
   // Calls a member. For a property put, the value is the last argument.
   virtual Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) = 0;
 };

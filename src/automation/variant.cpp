@@ -1,7 +1,10 @@
 #include "automation/variant.h"
 
+#include <cctype>
+#include <charconv>
 #include <cmath>
 #include <limits>
+#include <string_view>
 
 #include "automation/automation_error.h"
 #include "automation/vb_strings.h"
@@ -34,32 +37,28 @@ namespace {
 
 [[noreturn]] void TypeMismatch() { throw AutomationError(vberr::kTypeMismatch); }
 
-// A string converts to a number only when all of it is a number (CDbl("12x") fails).
+// A string converts to a number only when all of it is a number
+// (CDbl("12x") fails): a decimal number as VB writes it, or "&H" and up to
+// 32 bits of hex digits. C's own readers would also take "inf", "nan", hex
+// floats ("0x1p4") and signs inside the hex digits, which VB does not.
 double StringToDouble(const std::string& s) {
-  std::string t = Trim(s);
+  const std::string trimmed = Trim(s);
+  std::string_view t = trimmed;
+  // Leading white space of any kind is skipped; trailing only blanks.
+  while (!t.empty() && std::isspace(static_cast<unsigned char>(t.front()))) t.remove_prefix(1);
   if (t.empty()) TypeMismatch();
-  if (LCase(t) == "true") return -1;
-  if (LCase(t) == "false") return 0;
+  if (EqualsNoCase(t, "true")) return -1;
+  if (EqualsNoCase(t, "false")) return 0;
   if (t.size() > 2 && t[0] == '&' && (t[1] == 'H' || t[1] == 'h')) {
-    size_t used = 0;
-    unsigned long u = 0;
-    try {
-      u = std::stoul(t.substr(2), &used, 16);
-    } catch (...) {
-      TypeMismatch();
-    }
-    if (used != t.size() - 2 || u > 0xFFFFFFFFul) TypeMismatch();
+    uint64_t u = 0;
+    const char* end = t.data() + t.size();
+    const auto [stop, error] = std::from_chars(t.data() + 2, end, u, 16);
+    if (stop != end) TypeMismatch();
+    if (error == std::errc::result_out_of_range || u > 0xFFFFFFFFu) throw AutomationError(vberr::kOverflow);
     return static_cast<int32_t>(static_cast<uint32_t>(u));
   }
-  size_t used = 0;
-  double d = 0;
-  try {
-    d = std::stod(t, &used);
-  } catch (...) {
-    TypeMismatch();
-  }
-  if (used != t.size()) TypeMismatch();
-  return d;
+  if (DecimalNumberLength(t) != t.size()) TypeMismatch();
+  return DecimalNumberValue(t);
 }
 
 }  // namespace

@@ -1,10 +1,12 @@
 #include "automation/vb_strings.h"
 
 #include <cctype>
+#include <cerrno>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
 
+#include "automation/automation_error.h"
 #include "automation/variant.h"
 
 namespace kpx {
@@ -83,31 +85,46 @@ bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
   return a.size() < b.size();
 }
 
+size_t DecimalNumberLength(std::string_view s) {
+  auto isDigit = [&](size_t at) { return at < s.size() && std::isdigit(static_cast<unsigned char>(s[at])); };
+  size_t i = 0;
+  if (i < s.size() && (s[i] == '+' || s[i] == '-')) ++i;
+  size_t digits = 0;
+  while (isDigit(i)) ++i, ++digits;
+  if (i < s.size() && s[i] == '.') {
+    ++i;
+    while (isDigit(i)) ++i, ++digits;
+  }
+  if (digits == 0) return 0;
+  if (i < s.size() && (s[i] == 'e' || s[i] == 'E')) {
+    size_t j = i + 1;
+    if (j < s.size() && (s[j] == '+' || s[j] == '-')) ++j;
+    if (isDigit(j)) {
+      while (isDigit(j)) ++j;
+      i = j;
+    }
+  }
+  return i;
+}
+
+double DecimalNumberValue(std::string_view number) {
+  const std::string text(number);
+  errno = 0;
+  const double d = std::strtod(text.c_str(), nullptr);
+  // strtod saturates to infinity beyond the largest Double; below the
+  // smallest it gives 0 or a denormal, which is what VB reads there too.
+  if (errno == ERANGE && std::isinf(d)) throw AutomationError(vberr::kOverflow);
+  return d;
+}
+
 double Val(std::string_view s) {
   std::string t;
   for (char c : s)
     if (c != ' ' && c != '\t' && c != '\n' && c != '\r') t += c;  // Val skips white space everywhere
   if (t.size() > 2 && t[0] == '&' && (t[1] == 'H' || t[1] == 'h'))
     return static_cast<double>(static_cast<int32_t>(std::strtoul(t.c_str() + 2, nullptr, 16)));
-  // The longest prefix that reads as a decimal number.
-  size_t i = 0;
-  if (i < t.size() && (t[i] == '+' || t[i] == '-')) ++i;
-  size_t digits = 0;
-  while (i < t.size() && std::isdigit(static_cast<unsigned char>(t[i]))) ++i, ++digits;
-  if (i < t.size() && t[i] == '.') {
-    ++i;
-    while (i < t.size() && std::isdigit(static_cast<unsigned char>(t[i]))) ++i, ++digits;
-  }
-  if (digits == 0) return 0;
-  if (i < t.size() && (t[i] == 'e' || t[i] == 'E')) {
-    size_t j = i + 1;
-    if (j < t.size() && (t[j] == '+' || t[j] == '-')) ++j;
-    if (j < t.size() && std::isdigit(static_cast<unsigned char>(t[j]))) {
-      while (j < t.size() && std::isdigit(static_cast<unsigned char>(t[j]))) ++j;
-      i = j;
-    }
-  }
-  return std::strtod(t.substr(0, i).c_str(), nullptr);
+  const size_t length = DecimalNumberLength(t);
+  return length == 0 ? 0 : DecimalNumberValue(std::string_view(t).substr(0, length));
 }
 
 double RoundHalfEven(double d) { return std::nearbyint(d); }  // the default rounding mode is to-even

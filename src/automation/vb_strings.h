@@ -42,7 +42,15 @@ struct NoCaseLess {
 
 // Val: the leading number of a text (blanks skipped, stops at the first
 // character that cannot continue it), 0 when there is none. "&H" hex is read.
+// A number beyond a Double's range raises 6 (overflow).
 double Val(std::string_view s);
+
+// How VB writes a decimal number: an optional sign, digits with at most one
+// decimal point, an optional exponent ("e" or "E", a sign, digits). The
+// length of the longest leading part of `s` written so, 0 when none is.
+size_t DecimalNumberLength(std::string_view s);
+// The value of such a number; raises 6 (overflow) beyond a Double's range.
+double DecimalNumberValue(std::string_view number);
 
 // Rounding to a whole number with ties to even (VB's CInt, CLng, Round).
 double RoundHalfEven(double d);

@@ -7,11 +7,11 @@
 #include "addin/api.h"
 #include "automation/error_styles.h"
 #include "com/registration.h"
-#include "com/token_scanner_object.h"
 #include "platform/win32/com_errors.h"
 #include "platform/win32/object_dispatch.h"
 #include "platform/win32/win32_platform.h"
 #include "shared/module.h"
+#include "shared/token_scanner_object.h"
 
 namespace kpx::com {
 
@@ -26,7 +26,7 @@ constexpr ClassRegistration kClasses[] = {
 // add-in's state lives.
 struct TypeInfos {
   ITypeLib* lib = nullptr;
-  win32::ExposedType api, scanner, delimiters;
+  win32::ExposedType api, scanner;
 
   explicit TypeInfos(HINSTANCE module) {
     if (FAILED(LoadEmbeddedTypeLib(module, &lib))) {
@@ -35,10 +35,9 @@ struct TypeInfos {
     }
     api = Load(DIID__API);
     scanner = Load(DIID__TokenScanner);
-    delimiters = Load(DIID__Delimiters);
   }
   ~TypeInfos() {
-    for (win32::ExposedType* t : {&api, &scanner, &delimiters})
+    for (win32::ExposedType* t : {&api, &scanner})
       if (t->typeInfo) t->typeInfo->Release();
     if (lib) lib->Release();
   }
@@ -70,7 +69,6 @@ struct AddInLibrary::State {
         bridge(locks, [this](const Object& o) -> const win32::ExposedType* {
           if (dynamic_cast<const API*>(&o)) return TypeInfos::OrNull(types.api);
           if (dynamic_cast<const TokenScannerObject*>(&o)) return TypeInfos::OrNull(types.scanner);
-          if (dynamic_cast<const DelimitersObject*>(&o)) return TypeInfos::OrNull(types.delimiters);
           return nullptr;
         }),
         platform(bridge),
@@ -163,8 +161,8 @@ HRESULT AddInLibrary::CreateApi(REFIID iid, void** out) {
 
 HRESULT AddInLibrary::CreateTokenScanner(REFIID iid, void** out) {
   try {
-    EnsureState();
-    return Expose(std::make_shared<TokenScannerObject>(), iid, out);
+    State& state = EnsureState();
+    return Expose(std::make_shared<TokenScannerObject>(state.module.platform().objects), iid, out);
   } catch (...) {
     AutomationError error = CurrentError();
     win32::SetThreadErrorInfo(error, win32::ObjectDispatch::kErrorSource, IID_IDispatch);

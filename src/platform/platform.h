@@ -94,6 +94,9 @@ class ObjectFactory {
   // `New` of a class known by its class id, used through interface `iid`.
   // Ids are in registry form, "{XXXXXXXX-...}". Raises 429 on failure.
   virtual ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) = 0;
+  // A new keyed collection: the Scripting Runtime's dictionary where the
+  // system has one; by default the add-in's own, shaped like it.
+  virtual ObjectPtr CreateDictionary();
 };
 
 // ----------------------------------------------------------- user interface

@@ -8,12 +8,18 @@
 namespace kpx {
 
 bool TokenScanner::IsDelimiter(std::string_view s) const {
+  if (externalTest_) return externalTest_(s);
   if (s.size() == 1) return singleChar_[static_cast<unsigned char>(s[0])];
   return std::find(delimitors_.begin(), delimitors_.end(), s) != delimitors_.end();
 }
 
+bool TokenScanner::IsDelimiterChar(char c) const {
+  if (externalTest_) return externalTest_(std::string_view(&c, 1));
+  return singleChar_[static_cast<unsigned char>(c)];
+}
+
 void TokenScanner::AddDelimiter(std::string_view d) {
-  if (d.empty() || IsDelimiter(d)) return;
+  if (d.empty() || std::find(delimitors_.begin(), delimitors_.end(), d) != delimitors_.end()) return;
   delimitors_.emplace_back(d);
   if (d.size() == 1) singleChar_.set(static_cast<unsigned char>(d[0]));
 }
@@ -21,11 +27,33 @@ void TokenScanner::AddDelimiter(std::string_view d) {
 void TokenScanner::SetDelimitors(std::vector<std::string> delimitors) {
   delimitors_.clear();
   singleChar_.reset();
+  externalTest_ = nullptr;
   for (const std::string& d : delimitors) AddDelimiter(d);
 }
 
+const std::string& TokenScanner::ScanString() {
+  if (sourceOffset_ < source_.size()) head_.append(source_, sourceOffset_, std::string::npos);
+  source_.clear();
+  sourceOffset_ = 0;
+  return head_;
+}
+
+void TokenScanner::SetScanString(std::string s) {
+  head_.clear();
+  source_ = std::move(s);
+  sourceOffset_ = 0;
+}
+
+std::string TokenScanner::Slice(size_t from, size_t count) const {
+  if (from >= head_.size()) return source_.substr(sourceOffset_ + (from - head_.size()), count);
+  if (from + count <= head_.size()) return head_.substr(from, count);
+  std::string out = head_.substr(from);
+  out.append(source_, sourceOffset_, count - out.size());
+  return out;
+}
+
 bool TokenScanner::Init(std::string_view theScanString, std::string_view theDelimitors) {
-  scanString_ = theScanString;
+  SetScanString(std::string(theScanString));
   position_ = 0;
   tokenStart_ = 0;
   currentToken_.clear();
@@ -33,8 +61,7 @@ bool TokenScanner::Init(std::string_view theScanString, std::string_view theDeli
 
   const char separator = theDelimitors[0];
   std::string_view list = theDelimitors.substr(1);
-  delimitors_.clear();
-  singleChar_.reset();
+  SetDelimitors({});
   size_t from = 0;
   for (size_t at = list.find(separator); at != std::string_view::npos; at = list.find(separator, from)) {
     AddDelimiter(list.substr(from, at - from));
@@ -47,7 +74,7 @@ bool TokenScanner::Init(std::string_view theScanString, std::string_view theDeli
 }
 
 std::string TokenScanner::NextToken() {
-  const int32_t length = static_cast<int32_t>(scanString_.size());
+  const int32_t length = static_cast<int32_t>(Length());
   // Empty tokens and tokens that are delimiters themselves are skipped by
   // looping rather than recursing: a long run of delimiters is one call.
   for (;;) {
@@ -55,10 +82,9 @@ std::string TokenScanner::NextToken() {
     tokenStart_ = position_;
     do {
       ++position_;
-    } while (position_ <= length &&
-             !singleChar_[static_cast<unsigned char>(scanString_[static_cast<size_t>(position_ - 1)])]);
+    } while (position_ <= length && !IsDelimiterChar(At(static_cast<size_t>(position_ - 1))));
     if (position_ - tokenStart_ > 1) {
-      currentToken_ = scanString_.substr(static_cast<size_t>(tokenStart_), static_cast<size_t>(position_ - tokenStart_ - 1));
+      currentToken_ = Slice(static_cast<size_t>(tokenStart_), static_cast<size_t>(position_ - tokenStart_ - 1));
       if (!IsDelimiter(currentToken_)) return currentToken_;
     } else if (position_ >= length) {
       return currentToken_;
@@ -68,10 +94,25 @@ std::string TokenScanner::NextToken() {
 
 bool TokenScanner::ReplaceCurrentToken(std::string_view aString) {
   if (currentToken_.empty()) return false;
-  const int32_t oldLength = static_cast<int32_t>(scanString_.size());
-  std::string tail = position_ <= oldLength ? scanString_.substr(static_cast<size_t>(position_ - 1)) : std::string();
-  scanString_ = scanString_.substr(0, static_cast<size_t>(tokenStart_)) + std::string(aString) + tail;
-  position_ += static_cast<int32_t>(scanString_.size()) - oldLength;
+  const size_t oldLength = Length();
+  const size_t start = static_cast<size_t>(tokenStart_);
+  // Where the kept rest begins: the delimiter that ended the token.
+  const size_t rest = static_cast<size_t>(position_) <= oldLength ? static_cast<size_t>(position_ - 1) : oldLength;
+  const size_t headSize = head_.size();
+  if (rest >= headSize) {
+    // The usual case: the token lies at or past the end of the finished
+    // head. The text before it joins the head, the rest stays where it is.
+    const size_t restInSource = sourceOffset_ + (rest - headSize);
+    if (start >= headSize)
+      head_.append(source_, sourceOffset_, start - headSize);
+    else
+      head_.resize(start);  // the same token replaced again
+    head_.append(aString);
+    sourceOffset_ = restInSource;
+  } else {
+    head_.replace(start, rest - start, aString);
+  }
+  position_ += static_cast<int32_t>(Length()) - static_cast<int32_t>(oldLength);
   return true;
 }
 

@@ -27,6 +27,12 @@
 //    model's) and without the "Init time=" line (it says how long the real
 //    activation took).
 //
+// The model's faults reach the DLL where they lie in the simulated world:
+// host calls and resource texts fail inside the sim's objects, which the DLL
+// calls through COM. Registry faults must be made real, as the DLL uses the
+// registry itself (see MakeRegistryFaults); a scenario whose faults cannot
+// be is reported as skipped, with the reason.
+//
 // Usage: kpx-comsim <scenario.json> <golden.jsonl> <out.jsonl>
 // Exit: 0 same, 1 different, 2 bad input or failure, 3 skipped.
 
@@ -97,7 +103,81 @@ std::vector<std::pair<HKEY, std::string>> TreesOf(const ModelDef& model, const S
   for (const RegistryEntry& e : model.registry) add(e);
   for (const Action& a : scenario.actions)
     for (const RegistryEntry& e : a.registry) add(e);
+  for (const RegistryFaultDef& f : model.faults.registry) add(RegistryEntry{f.root, f.key, std::nullopt, {}});
   return trees;
+}
+
+HKEY RootHandle(platform::RootKey root) {
+  return root == platform::RootKey::CurrentUser ? HKEY_CURRENT_USER : HKEY_LOCAL_MACHINE;
+}
+
+std::string Joined(const std::vector<std::string>& parts, size_t count) {
+  std::string key;
+  for (size_t i = 0; i < count && i < parts.size(); ++i) key += (i ? "\\" : "") + parts[i];
+  return key;
+}
+
+// Whether `inner` is the key `outer` or lies below it.
+bool AtOrBelow(const std::string& inner, const std::string& outer) {
+  return inner.size() >= outer.size() && _strnicmp(inner.c_str(), outer.c_str(), outer.size()) == 0 &&
+         (inner.size() == outer.size() || inner[outer.size()] == '\\');
+}
+
+// The model's registry faults made real, as far as the real registry can
+// have them; "" when done, else why not. The DLL reaches the registry
+// straight through Win32, past the simulation:
+//  - a key that cannot be created: Windows lets no lasting key be made
+//    beneath a volatile one (ERROR_CHILD_MUST_BE_VOLATILE), so the missing
+//    keys above it are made volatile. That needs its parent missing before
+//    the run, and no key of the run beneath the volatile ones;
+//  - a value that reads back other than written: the real registry gives
+//    back what was written, so this cannot be had.
+std::string MakeRegistryFaults(const ModelDef& model, const Scenario& scenario) {
+  for (const RegistryFaultDef& f : model.faults.registry)
+    if (!f.reads.empty())
+      return "the model makes values of " + RootName(f.root) + "\\" + f.key +
+             " read back other than written, and the real registry the DLL reads gives back what was written";
+  for (const RegistryFaultDef& f : model.faults.registry) {
+    if (!f.cannotCreate) continue;
+    const std::string where = RootName(f.root) + "\\" + f.key;
+    std::vector<std::string> parts;
+    std::stringstream in(f.key);
+    for (std::string p; std::getline(in, p, '\\');) parts.push_back(p);
+    const HKEY root = RootHandle(f.root);
+    size_t missing = 0;  // keys from parts[0 .. missing) exist
+    for (; missing < parts.size(); ++missing) {
+      HKEY key = nullptr;
+      if (RegOpenKeyExA(root, Joined(parts, missing + 1).c_str(), 0, KEY_READ, &key) != ERROR_SUCCESS) break;
+      RegCloseKey(key);
+    }
+    if (missing + 1 >= parts.size())
+      return "the parent of " + where + " exists before the run, so it cannot be made volatile to keep the key out";
+    const std::string top = Joined(parts, missing + 1);
+    std::vector<const RegistryEntry*> entries;
+    for (const RegistryEntry& e : model.registry) entries.push_back(&e);
+    for (const Action& a : scenario.actions)
+      for (const RegistryEntry& e : a.registry) entries.push_back(&e);
+    for (const RegistryEntry* e : entries)
+      if (e->root == f.root && AtOrBelow(e->key, top))
+        return "the run puts " + RootName(e->root) + "\\" + e->key + " beneath " + RootName(f.root) + "\\" + top +
+               ", which must be volatile to keep " + where + " out";
+    for (size_t n = missing + 1; n < parts.size(); ++n) {
+      HKEY key = nullptr;
+      if (RegCreateKeyExA(root, Joined(parts, n).c_str(), 0, nullptr, REG_OPTION_VOLATILE, KEY_ALL_ACCESS, nullptr,
+                          &key, nullptr) != ERROR_SUCCESS)
+        return "cannot create the volatile key " + Joined(parts, n);
+      RegCloseKey(key);
+    }
+    // The add-in's own way of creating it must now fail.
+    HKEY key = nullptr;
+    if (RegCreateKeyExA(root, f.key.c_str(), 0, nullptr, REG_OPTION_NON_VOLATILE, KEY_ALL_ACCESS, nullptr, &key,
+                        nullptr) == ERROR_SUCCESS) {
+      RegCloseKey(key);
+      RegDeleteKeyA(root, f.key.c_str());
+      return "this system lets a lasting key be created beneath a volatile one, so " + where + " can be created";
+    }
+  }
+  return "";
 }
 
 void RemoveTrees(const std::vector<std::pair<HKEY, std::string>>& trees) {
@@ -403,15 +483,20 @@ class HostView final : public Object {
 };
 
 // The add-in as the Quarn host makes it: by its ProgID, through COM.
-ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
+// An in-process object by ProgID, as an Object of this host.
+ObjectPtr CreateByProgId(win32::ComBridge& bridge, const wchar_t* progId) {
   CLSID clsid;
   IDispatch* d = nullptr;
-  HRESULT hr = CLSIDFromProgID(L"kpxAddIn.API", &clsid);
+  HRESULT hr = CLSIDFromProgID(progId, &clsid);
   if (SUCCEEDED(hr)) hr = CoCreateInstance(clsid, nullptr, CLSCTX_INPROC_SERVER, IID_IDispatch, reinterpret_cast<void**>(&d));
   if (FAILED(hr)) throw ErrorOfCreation(hr);
-  ObjectPtr api = bridge.Adopt(d);
+  ObjectPtr object = bridge.Adopt(d);
   d->Release();
-  return std::make_shared<HostView>(std::move(api));
+  return object;
+}
+
+ObjectPtr CreateAddIn(win32::ComBridge& bridge) {
+  return std::make_shared<HostView>(CreateByProgId(bridge, L"kpxAddIn.API"));
 }
 
 // ------------------------------------------------------------ comparing
@@ -538,6 +623,12 @@ int Main(int argc, char** argv) {
   const auto trees = TreesOf(model, scenario);
   RemoveTrees(trees);
   RemoveJournaled();
+  const std::string unmade = MakeRegistryFaults(model, scenario);
+  if (!unmade.empty()) {
+    RemoveTrees(trees);
+    std::printf("  skipped: %s\n", unmade.c_str());
+    return 3;
+  }
 
   win32::Win32Registry registry;
   win32::Win32FileSystem files;
@@ -566,7 +657,11 @@ int Main(int argc, char** argv) {
     // The host's bridge outlives the simulation: the add-in object the
     // simulation holds came through it.
     std::unique_ptr<Host> host;
-    Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); });
+    // The scenario's token scanner is the DLL's, its dictionary the
+    // Scripting Runtime's.
+    ScenarioObjectFactories objects{[&host] { return CreateByProgId(host->bridge, L"kpxAddIn.TokenScanner"); },
+                                    [&host] { return CreateByProgId(host->bridge, L"Scripting.Dictionary"); }};
+    Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); }, objects);
     host = std::make_unique<Host>(model, sim.platform().objects);
     host->RegisterAll();
     {

@@ -214,6 +214,12 @@ std::string Folded(std::string_view name) {
 
 bool EndsWithSeparator(std::string_view path) { return !path.empty() && IsSeparator(path.back()); }
 
+// The Windows API reads a path up to its first NUL, and so must the sandbox:
+// the host system would cut the mapped path there too, but only after the
+// case-blind lookup had kept what follows, so a file could be made beside
+// an existing one that differs only in case.
+std::string_view Win32Path(std::string_view path) { return path.substr(0, path.find('\0')); }
+
 }  // namespace
 
 // The entry of `folder` that matches `name`: the exact spelling when
@@ -243,6 +249,7 @@ fs::path SandboxFileSystem::Resolve(const fs::path& folder, const std::string& n
 }
 
 fs::path SandboxFileSystem::HostPath(std::string_view windowsPath) const {
+  windowsPath = Win32Path(windowsPath);
   fs::path host = sandbox_;
   bool resolving = true;  // once a component is missing, nothing below it exists either
   for (const std::string& part : WindowsComponents(windowsPath)) {
@@ -258,12 +265,14 @@ fs::path SandboxFileSystem::HostPath(std::string_view windowsPath) const {
 }
 
 bool SandboxFileSystem::Exists(std::string_view path) {
+  path = Win32Path(path);
   if (path.empty()) return false;
   std::error_code ec;
   return fs::exists(HostPath(path), ec);
 }
 
 bool SandboxFileSystem::DeleteFile(std::string_view path) {
+  path = Win32Path(path);
   if (path.empty() || EndsWithSeparator(path)) return false;
   const fs::path host = HostPath(path);
   std::error_code ec;
@@ -272,6 +281,7 @@ bool SandboxFileSystem::DeleteFile(std::string_view path) {
 }
 
 bool SandboxFileSystem::AppendText(std::string_view path, std::string_view text) {
+  path = Win32Path(path);
   // "C:\logs\" names a folder, never a file to append to.
   if (path.empty() || EndsWithSeparator(path)) return false;
   const fs::path host = HostPath(path);

@@ -55,7 +55,8 @@ class FileRegistry final : public platform::Registry {
 };
 
 // Windows paths ("C:\dir\f.txt") map to <sandbox>/C/dir/f.txt; a path
-// without a drive letter is taken relative to the sandbox's "C" drive.
+// without a drive letter is taken relative to the sandbox's "C" drive. As
+// for the Windows API, a path ends at its first NUL.
 class SandboxFileSystem final : public platform::FileSystem {
  public:
   explicit SandboxFileSystem(std::filesystem::path sandbox);

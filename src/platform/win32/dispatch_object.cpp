@@ -165,6 +165,33 @@ Variant DispatchObject::Invoke(DispId id, CallKind kind, std::span<Variant> args
   return out;
 }
 
+ObjectPtr DispatchObject::QueryInterface(std::string_view iid) {
+  std::wstring wide = Utf8ToWide(iid);
+  IID id;
+  if (FAILED(IIDFromString(wide.c_str(), &id))) throw AutomationError(vberr::kTypeMismatch);
+  IDispatch* other = nullptr;
+  HRESULT hr = dispatch_->QueryInterface(id, reinterpret_cast<void**>(&other));
+  if (hr == E_NOINTERFACE || (SUCCEEDED(hr) && !other)) throw AutomationError(vberr::kTypeMismatch);
+  if (FAILED(hr)) throw ErrorFromHResult(hr);
+  // Every interface the add-in asks for this way is dual, so the pointer is
+  // an IDispatch of its own.
+  auto object = std::make_shared<InterfaceObject>(bridge_, other);
+  other->Release();
+  return object;
+}
+
+DispId InterfaceObject::IdOfName(std::string_view name) {
+  ITypeInfo* ti = nullptr;
+  if (FAILED(dispatch()->GetTypeInfo(0, LOCALE_USER_DEFAULT, &ti)) || !ti) return DispatchObject::IdOfName(name);
+  std::wstring wide = Utf8ToWide(name);
+  LPOLESTR names[] = {wide.data()};
+  MEMBERID id = MEMBERID_NIL;
+  HRESULT hr = ti->GetIDsOfNames(names, 1, &id);
+  ti->Release();
+  if (FAILED(hr)) throw ErrorFromHResult(hr == DISP_E_UNKNOWNNAME ? DISP_E_MEMBERNOTFOUND : hr);
+  return id;
+}
+
 // ------------------------------------------------------------- resources
 
 EarlyBoundResourceObject::EarlyBoundResourceObject(ComBridge& bridge, IFirstOperationStringById* object,

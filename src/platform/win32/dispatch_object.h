@@ -30,6 +30,9 @@ class DispatchObject : public Object {
   // Variants afterwards (also when the call failed: a callee may have
   // written them before it failed).
   Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+  // QueryInterface for the interface; the result finds names in that
+  // interface's own type information.
+  ObjectPtr QueryInterface(std::string_view iid) override;
 
   IDispatch* dispatch() const { return dispatch_; }
 
@@ -38,6 +41,16 @@ class DispatchObject : public Object {
 
  private:
   IDispatch* dispatch_;
+};
+
+// One interface of an object, reached by QueryInterface: names are looked up
+// in the interface's own type information, so a member of that interface is
+// found even where the object's default interface has one of the same name
+// (or none). Without type information it asks the interface pointer itself.
+class InterfaceObject final : public DispatchObject {
+ public:
+  using DispatchObject::DispatchObject;
+  DispId IdOfName(std::string_view name) override;
 };
 
 // The first own operation of an early-bound interface: HRESULT (long, BSTR*)

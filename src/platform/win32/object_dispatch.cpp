@@ -35,7 +35,19 @@ HRESULT ObjectDispatch::QueryInterface(REFIID iid, void** out) {
   } else if (IsEqualIID(iid, IID_IKpxExposedObject)) {
     *out = static_cast<IKpxExposedObject*>(this);
   } else {
-    return E_NOINTERFACE;
+    // Another interface of the object, if it offers one: served as an
+    // IDispatch of its own.
+    wchar_t text[40];
+    if (!StringFromGUID2(iid, text, 40)) return E_NOINTERFACE;
+    ObjectPtr view;
+    try {
+      view = object_->QueryInterface(WideToUtf8(text));
+    } catch (...) {
+      return E_NOINTERFACE;
+    }
+    if (!view) return E_NOINTERFACE;
+    *out = bridge_.Expose(view);
+    return S_OK;
   }
   AddRef();
   return S_OK;

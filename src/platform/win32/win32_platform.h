@@ -42,6 +42,8 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
   explicit Win32ObjectFactory(ComBridge& bridge) : bridge_(bridge) {}
   ObjectPtr CreateObject(std::string_view progId) override;
   ObjectPtr CreateInstance(std::string_view clsid, std::string_view iid) override;
+  // The Scripting Runtime's dictionary.
+  ObjectPtr CreateDictionary() override { return CreateObject("Scripting.Dictionary"); }
 
  private:
   ComBridge& bridge_;
