@@ -33,13 +33,13 @@ class DocumentBuilder {
 
   explicit DocumentBuilder(InputJson& root) : root_(root) {}
 
-  bool null() { return Put(nullptr) != nullptr; }
-  bool boolean(bool v) { return Put(v) != nullptr; }
-  bool number_integer(number_integer_t v) { return Put(v) != nullptr; }
-  bool number_unsigned(number_unsigned_t v) { return Put(v) != nullptr; }
-  bool number_float(number_float_t v, const string_t&) { return Put(v) != nullptr; }
-  bool string(string_t& v) { return Put(std::move(v)) != nullptr; }
-  bool binary(binary_t& v) { return Put(InputJson::binary(std::move(v))) != nullptr; }
+  bool null() { return Scalar(nullptr); }
+  bool boolean(bool v) { return Scalar(v); }
+  bool number_integer(number_integer_t v) { return Scalar(v); }
+  bool number_unsigned(number_unsigned_t v) { return Scalar(v); }
+  bool number_float(number_float_t v, const string_t&) { return Scalar(v); }
+  bool string(string_t& v) { return Scalar(std::move(v)); }
+  bool binary(binary_t& v) { return Scalar(InputJson::binary(std::move(v))); }
   bool start_object(std::size_t) { return Open(InputJson::object()); }
   bool start_array(std::size_t) { return Open(InputJson::array()); }
   bool end_object() {
@@ -99,6 +99,11 @@ class DocumentBuilder {
     std::vector<std::pair<std::string, InputJson>> members;  // of an object, until it closes
     std::unordered_set<std::string> keys;
   };
+
+  bool Scalar(InputJson&& v) {
+    Put(std::move(v));
+    return true;
+  }
 
   // Stores a value where the parser is; returns where it went. A container
   // is added to only while it is innermost, so the places of the open ones

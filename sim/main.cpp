@@ -212,8 +212,10 @@ std::unique_ptr<Input> Read(const Options& o) {
 int Run(const Options& o, SignalGuard& guard) {
   const std::unique_ptr<Input> input = Read(o);
   const std::string scenarioFile = o.files.back();
+  Sandbox sandbox(o.sandbox, guard);
 
-  // Opened only now: a bad input leaves an earlier output as it was.
+  // Opened only now: bad input, or a sandbox that cannot be made, leaves an
+  // earlier output as it was.
   std::ofstream file;
   if (o.out) {
     std::error_code ec;
@@ -238,7 +240,6 @@ int Run(const Options& o, SignalGuard& guard) {
     sink->Flush();
   };
 
-  Sandbox sandbox(o.sandbox, guard);
   kpx::posix::FileRegistry registry(sandbox.dir() / "registry.reg");
   kpx::posix::SandboxFileSystem files(sandbox.dir());
   FileSeeder seeder([&files](std::string_view path) { return files.HostPath(path); });
