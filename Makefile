@@ -7,7 +7,7 @@ WIN32_DIR  := $(BUILD)/win-x86
 FUZZ_DIR   := $(BUILD)/fuzz
 FUZZ_SECONDS ?= 60
 
-.PHONY: all setup native windows wintest test demo bench fuzz clean
+.PHONY: all setup native windows wintest test demo bench bench-com fuzz clean
 
 all: native
 
@@ -42,6 +42,11 @@ bench:
 	cmake -S . -B $(BUILD)/bench -DCMAKE_BUILD_TYPE=Release
 	cmake --build $(BUILD)/bench -j $(JOBS) --target kpx-bench
 	$(BUILD)/bench/bench/kpx-bench
+
+# What COM costs: the host-call benchmarks natively and on the real DLL
+# through IDispatch under Wine, x64 and x86, side by side.
+bench-com:
+	BUILD=$(BUILD) scripts/bench-com.sh
 
 # libFuzzer with clang, the libraries instrumented as well as the targets;
 # each target runs FUZZ_SECONDS, one after the other. `make fuzz

@@ -1,8 +1,14 @@
 // Host calls on the paths where the host waits for the add-in: enabling the
-// class menu when the user right-clicks one class, and activation. In the
-// real host every call is a round trip through automation, so the count per
-// member is the number to watch; the time measured here is mostly the
-// simulated host's own bookkeeping.
+// class menu when the user right-clicks one class, activation, and the
+// add-in's name. In the real host every call is a round trip through
+// automation, so the count per member is the number to watch.
+//
+// Each member runs twice: plain, for its time, and metered ("metered:1"),
+// whose counter host_ns is the share of that time spent inside the
+// simulated host's objects and the companions. The add-in's own share is
+// the one less the other; bench/com/ measures the same members of the real
+// DLL through COM under Wine, and scripts/bench-com.sh sets them side by
+// side.
 #include <benchmark/benchmark.h>
 
 #include <atomic>
@@ -10,6 +16,8 @@
 #include <filesystem>
 #include <string>
 
+#include "bench_model.h"
+#include "host_meter.h"
 #include "platform/posix/posix_platform.h"
 #include "sim/json_source.h"
 #include "sim/model_file.h"
@@ -17,30 +25,6 @@
 
 namespace kpx::sim {
 namespace {
-
-// One plain class assigned to a VC++ component that passes the component
-// check: the longest way through the class menu's rules (components, then
-// stereotype, then class kind). The IDE add-in is registered already and
-// logging is off, as on a user's machine after the first start.
-constexpr const char* kModel = R"({
-  "registry": {
-    "HKLM\\SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VisualStudio": {"Debug": 0},
-    "HKLM\\SOFTWARE\\Microsoft\\VisualStudio\\6.0\\Setup\\Microsoft Visual C++": {"ProductDir": "C:\\VC98"},
-    "HKCU\\Software\\Microsoft\\DevStudio\\6.0\\AddIns\\kpxIDEAddin.DSAddIn": {
-      "@": "1", "Filename": "C:\\Program Files\\Quarn\\vc\\dlls\\kpxideaddin.dll"}
-  },
-  "files": {"C:\\Program Files\\Quarn\\vc\\dlls\\kpxideaddin.dll": ""},
-  "addins": [{"name": "VC++", "settings": {"Events": {"OnUser1": "C|Generate docs|Tools.DocGen"}}},
-             {"name": "VisualStudio"}],
-  "companions": [{"clsid": "{CFD996E3-1393-11D3-B9F3-006008BF3ACB}",
-                  "operations": ["Init", "Terminate", "ShowComponentOptions", "CheckComponent"],
-                  "members": {"Terminate": {}, "CheckComponent": {"returns": true}}}],
-  "model": {
-    "elements": [{"kind": "Module", "name": "Shapes", "language": "VC++"},
-                 {"kind": "Class", "name": "CShape", "language": "VC++", "components": ["Shapes"]}],
-    "selection": ["CShape"]
-  }
-})";
 
 // A throw-away sandbox for the simulated drives.
 class Sandbox {
@@ -69,7 +53,7 @@ class Sandbox {
 class ActivatedHost {
  public:
   ActivatedHost()
-      : source_("bench-model.json", kModel),
+      : source_("bench-model.json", bench::kHostCallsModel),
         model_(LoadModel(source_)),
         files_(sandbox_.path()),
         seeder_([this](std::string_view p) { return files_.HostPath(p); }),
@@ -83,6 +67,7 @@ class ActivatedHost {
   API& api() { return *sim_.api(); }
   ObjectPtr& app() { return app_; }
   uint64_t hostCalls() const { return sim_.log().hostCalls(); }
+  void Observe(CallObserver* observer) { sim_.log().Observe(observer); }
   // The events are not read; keep memory flat over millions of calls.
   void DropEvents() {
     if (sim_.log().events().size() > 4096) sim_.log().Clear();
@@ -99,6 +84,12 @@ class ActivatedHost {
   ObjectPtr app_;
 };
 
+void BM_Name(benchmark::State& state) {
+  ActivatedHost host;
+  bench::MeasureMember(state, host, [&] { benchmark::DoNotOptimize(host.api().Name()); });
+}
+BENCHMARK(BM_Name)->ArgName("metered")->Arg(0)->Arg(1);
+
 void BM_EnableClassMenuOneClass(benchmark::State& state) {
   ActivatedHost host;
   int16_t itemType = 4;
@@ -107,28 +98,15 @@ void BM_EnableClassMenuOneClass(benchmark::State& state) {
   uint64_t before = host.hostCalls();
   host.api().OnEnableContextMenuItems(host.app(), itemType);
   state.counters["hostCallsFirst"] = static_cast<double>(host.hostCalls() - before);
-
-  before = host.hostCalls();
-  for (auto _ : state) {
-    host.api().OnEnableContextMenuItems(host.app(), itemType);
-    host.DropEvents();
-  }
-  state.counters["hostCalls"] =
-      benchmark::Counter(static_cast<double>(host.hostCalls() - before), benchmark::Counter::kAvgIterations);
+  bench::MeasureMember(state, host, [&] { host.api().OnEnableContextMenuItems(host.app(), itemType); });
 }
-BENCHMARK(BM_EnableClassMenuOneClass);
+BENCHMARK(BM_EnableClassMenuOneClass)->ArgName("metered")->Arg(0)->Arg(1);
 
 void BM_Activate(benchmark::State& state) {
   ActivatedHost host;
-  const uint64_t before = host.hostCalls();
-  for (auto _ : state) {
-    host.api().OnActivate(host.app());
-    host.DropEvents();
-  }
-  state.counters["hostCalls"] =
-      benchmark::Counter(static_cast<double>(host.hostCalls() - before), benchmark::Counter::kAvgIterations);
+  bench::MeasureMember(state, host, [&] { host.api().OnActivate(host.app()); });
 }
-BENCHMARK(BM_Activate);
+BENCHMARK(BM_Activate)->ArgName("metered")->Arg(0)->Arg(1);
 
 }  // namespace
 }  // namespace kpx::sim

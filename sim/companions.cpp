@@ -48,6 +48,7 @@ void CompanionObject::RecordFailure(EventJson call, const AutomationError& error
 }
 
 DispId CompanionObject::IdOfName(std::string_view name) {
+  ObservedCall observed(world_.log().observer());
   for (size_t i = 0; i < names_.size(); ++i)
     if (EqualsNoCase(names_[i], name)) return static_cast<DispId>(i + 1);
   const AutomationError error(vberr::kNoSuchMember);
@@ -56,6 +57,7 @@ DispId CompanionObject::IdOfName(std::string_view name) {
 }
 
 DispId CompanionObject::IdOfOwnOperation(int position) {
+  ObservedCall observed(world_.log().observer());
   if (position >= 1 && static_cast<size_t>(position) <= def_->operations.size())
     return IdOfName(def_->operations[static_cast<size_t>(position - 1)]);
   const AutomationError error(vberr::kNoSuchMember);
@@ -105,6 +107,7 @@ Variant CompanionObject::Invoke(DispId dispId, CallKind kind, std::span<Variant>
 }
 
 Variant CompanionObject::InvokeThrough(const std::string* iid, DispId dispId, CallKind kind, std::span<Variant> args) {
+  ObservedCall observed(world_.log().observer());
   if (dispId < 1 || static_cast<size_t>(dispId) > names_.size()) throw AutomationError(vberr::kNoSuchMember);
   const std::string& name = names_[static_cast<size_t>(dispId - 1)];
   EventLog& log = world_.log();

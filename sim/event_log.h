@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "automation/automation_error.h"
+#include "automation/call_observer.h"
 #include "automation/object.h"
 
 namespace kpx::sim {
@@ -60,6 +61,9 @@ class EventLog {
   // how many it made.
   void CountHostCall() { ++hostCalls_; }
   uint64_t hostCalls() const { return hostCalls_; }
+  // Told of every call into a host object or a companion (nullptr: none).
+  void Observe(CallObserver* observer) { observer_ = observer; }
+  CallObserver* observer() const { return observer_; }
 
   // Objects that are not the sim's own (the add-in object) get a label here.
   void NameObject(const Object* object, std::string label);
@@ -78,6 +82,7 @@ class EventLog {
   EventSink* sink_ = nullptr;
   std::vector<EventJson> events_;
   uint64_t hostCalls_ = 0;
+  CallObserver* observer_ = nullptr;
   std::map<const Object*, std::string> names_;
 };
 

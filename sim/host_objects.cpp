@@ -92,6 +92,7 @@ std::span<const MemberName> AddInNames(bool contextMenus) {
 
 DispId HostObject::IdOfName(std::string_view name) {
   world_.log().CountHostCall();
+  ObservedCall call(world_.log().observer());
   for (const MemberName& m : Names())
     if (EqualsNoCase(m.name, name)) return m.id;
   NoMember();
@@ -99,6 +100,7 @@ DispId HostObject::IdOfName(std::string_view name) {
 
 Variant HostObject::Invoke(DispId dispId, CallKind kind, std::span<Variant> args) {
   world_.log().CountHostCall();
+  ObservedCall call(world_.log().observer());
   for (const MemberName& m : Names())
     if (m.id == dispId) {
       world_.faults().Check(world_.log(), *this, m.name, args);  // an injected failure replaces the call

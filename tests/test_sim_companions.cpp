@@ -1,5 +1,7 @@
 // Companion components and the resource component as the model file
 // describes them.
+#include <algorithm>
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -122,6 +124,40 @@ TEST_F(SimCompanionTest, EachCreationIsANewInstanceAndFailuresAreRecorded) {
   EXPECT_EQ("Invalid class string", created[2]["error"]["description"]);
   EXPECT_FALSE(created[2].contains("instance"));
   EXPECT_EQ("{00000000-0000-0000-0000-000000000000}", created[4]["clsid"]);
+}
+
+// Counts the calls it is told of and how deep they nest.
+struct Spans final : CallObserver {
+  int entered = 0, left = 0, depth = 0, deepest = 0;
+  void Enter() override {
+    ++entered;
+    deepest = std::max(deepest, ++depth);
+  }
+  void Leave() override {
+    ++left;
+    --depth;
+  }
+};
+
+TEST_F(SimCompanionTest, AnObserverIsToldOfEveryCallIntoHostObjectsAndCompanionsRaisingOrNot) {
+  Spans spans;
+  w.log().Observe(&spans);
+  ObjectPtr app = w.world().application();
+  CallByName(app, "CurrentModel", CallKind::PropertyGet);  // the name, then the call
+  EXPECT_EQ(2, spans.entered);
+  ObjectPtr c = objects().CreateObject("kpxCompProps.API");
+  EXPECT_EQ(2, spans.entered);  // a creation is no call into the object
+  // By position: the operation's name is looked up inside the first call.
+  EXPECT_EQ(5, ErrorOf([&] { CallOwnOperation(c, 4, CallKind::Method, {Variant(c), Variant()}); }).number());
+  EXPECT_EQ(438, ErrorOf([&] { c->IdOfName("Finalize"); }).number());
+  EXPECT_EQ(438, ErrorOf([&] { app->Invoke(999, CallKind::Method, {}); }).number());
+  EXPECT_EQ(7, spans.entered);
+  EXPECT_EQ(spans.entered, spans.left);
+  EXPECT_EQ(0, spans.depth);
+  EXPECT_EQ(2, spans.deepest);
+  w.log().Observe(nullptr);
+  CallByName(app, "CurrentModel", CallKind::PropertyGet);
+  EXPECT_EQ(7, spans.entered);
 }
 
 TEST_F(SimCompanionTest, ResourceTextsComeFromTheModelFirstAndAreNotRecorded) {

@@ -13,6 +13,7 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <utility>
 
 #include "api_h.h"
 #include "kpxres_h.h"
@@ -125,6 +126,75 @@ void RegistrationRoundTrip(const Paths& paths) {
     const std::set<std::wstring> after = SnapshotClassesRoot(keys);
     CHECK(after == before);
     for (const std::wstring& left : after) std::printf("  left behind: %s\n", Narrow(left).c_str());
+
+    CHECK_EQ(Regsvr32(dll, false), 0ul);  // registered again for what follows
+  }
+}
+
+// On 64-bit Windows a 32-bit and a 64-bit build of one library can be
+// registered side by side: each in its own view of CLSID and Interface, both
+// under one ProgID and one TypeLib key. The other build is written here as
+// its regsvr32 writes it, in the other view; this build's /u must leave it
+// working, and the last /u must still leave nothing.
+void SideBySideRegistration(const Paths& paths) {
+  Group("regsvr32 /u leaves the other build's ProgIDs and type library platform; the last /u leaves nothing");
+  if (!HasOtherBuildsView()) {
+    std::printf("  not run: 32-bit Windows has one registry view\n");
+    return;
+  }
+  const REGSAM other = OtherBuildsView();
+  const bool is64 = sizeof(void*) == 8;
+  const std::wstring ownPlatform = is64 ? L"win64" : L"win32";
+  const std::wstring otherPlatform = is64 ? L"win32" : L"win64";
+  for (int pass = 0; pass < 2; ++pass) {
+    const bool addin = pass == 0;
+    const std::wstring& dll = addin ? paths.addin : paths.res;
+    const std::vector<std::wstring> keys = addin ? AddInKeys() : ResourceKeys();
+    std::vector<std::pair<std::wstring, std::wstring>> classes;  // class id, ProgID
+    if (addin) {
+      classes = {{Guid(CLSID_API), L"kpxAddIn.API"}, {Guid(CLSID_TokenScanner), L"kpxAddIn.TokenScanner"}};
+    } else {
+      classes = {{Guid(CLSID_KPXResourceInterface), L"kpxres.KPXResourceInterface"}};
+    }
+    const std::wstring versionKey = L"TypeLib\\" + Guid(addin ? LIBID_kpxAddIn : LIBID_kpxres) + L"\\1.0";
+    const std::wstring otherDll = L"C:\\other build\\" + dll.substr(dll.find_last_of(L'\\') + 1);
+
+    bool otherAlready = false;
+    for (const auto& [clsid, progId] : classes) {
+      HKEY probe = nullptr;
+      if (RegOpenKeyExW(HKEY_CLASSES_ROOT, (L"CLSID\\" + clsid).c_str(), 0, KEY_READ | other, &probe) == ERROR_SUCCESS) {
+        RegCloseKey(probe);
+        otherAlready = true;
+      }
+    }
+    if (!CHECK(!otherAlready)) {
+      std::printf("  the other build is registered in this registry: unregister it before the test\n");
+      continue;
+    }
+    for (const auto& [clsid, progId] : classes)
+      CHECK(WriteDefault(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid + L"\\InprocServer32", other, otherDll));
+    CHECK(WriteDefault(HKEY_CLASSES_ROOT, versionKey + L"\\0\\" + otherPlatform, 0, otherDll));
+
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> left = SnapshotClassesRoot(keys);
+    for (const auto& [clsid, progId] : classes) {
+      CHECK(Contains(left, progId + L"\\CLSID|=1:" + clsid));
+      CHECK(!Contains(left, L"CLSID\\" + clsid));
+    }
+    CHECK(Contains(left, versionKey + L"\\0\\" + otherPlatform + L"|=1:" + otherDll));
+    CHECK(Contains(left, versionKey + L"\\FLAGS"));
+    CHECK(!Contains(left, versionKey + L"\\0\\" + ownPlatform));
+
+    // The other build gone too, this build's /u takes what was shared.
+    for (const auto& [clsid, progId] : classes) {
+      CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid + L"\\InprocServer32", other));
+      CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, L"CLSID\\" + clsid, other));
+    }
+    CHECK(DeleteLeafKey(HKEY_CLASSES_ROOT, versionKey + L"\\0\\" + otherPlatform, 0));
+    CHECK_EQ(Regsvr32(dll, true), 0ul);
+    const std::set<std::wstring> after = SnapshotClassesRoot(keys);
+    CHECK(after.empty());
+    for (const std::wstring& line : after) std::printf("  left behind: %s\n", Narrow(line).c_str());
 
     CHECK_EQ(Regsvr32(dll, false), 0ul);  // registered again for what follows
   }
@@ -625,6 +695,69 @@ void BridgeAgainstHostObjects() {
   CHECK_EQ(locks.objects, 0L);
 }
 
+// Answers "Echo" (1) with its first argument; any other id raises 5.
+class Served final : public kpx::Object {
+ public:
+  kpx::DispId IdOfName(std::string_view name) override {
+    if (name == "Echo") return 1;
+    throw kpx::AutomationError(kpx::vberr::kNoSuchMember);
+  }
+  kpx::Variant Invoke(kpx::DispId id, kpx::CallKind, std::span<kpx::Variant> args) override {
+    if (id != 1) throw kpx::AutomationError(5);
+    return args.empty() ? kpx::Variant() : args[0];
+  }
+};
+
+// Counts the calls it is told of and how deep they nest.
+struct Spans final : kpx::CallObserver {
+  int entered = 0, left = 0, depth = 0, deepest = 0;
+  void Enter() override {
+    ++entered;
+    if (++depth > deepest) deepest = depth;
+  }
+  void Leave() override {
+    ++left;
+    --depth;
+  }
+};
+
+void ObservedServing() {
+  Group("a bridge tells its observer of every call into an object it serves, answered, failed or refused");
+  kpx::win32::ServerLocks locks;
+  Spans spans;
+  {
+    kpx::win32::ComBridge bridge(locks);
+    bridge.Observe(&spans);
+    Ref<IDispatch> served(bridge.Expose(std::make_shared<Served>()));
+    DISPID id = 0;
+    LPOLESTR echo = const_cast<LPOLESTR>(L"Echo");
+    LPOLESTR other = const_cast<LPOLESTR>(L"Other");
+    CHECK_HR(served->GetIDsOfNames(IID_NULL, &echo, 1, 0, &id), S_OK);
+    CHECK_HR(served->GetIDsOfNames(IID_NULL, &other, 1, 0, &id), DISP_E_UNKNOWNNAME);
+    Var arg = Var::I4(7);
+    DISPPARAMS params{&arg.v, nullptr, 1, 0};
+    VARIANT result;
+    VariantInit(&result);
+    CHECK_HR(served->Invoke(1, IID_NULL, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr), S_OK);
+    CHECK(result.vt == VT_I4 && result.lVal == 7);
+    VariantClear(&result);
+    EXCEPINFO info{};
+    CHECK_HR(served->Invoke(2, IID_NULL, 0, DISPATCH_METHOD, &params, &result, &info, nullptr), DISP_E_EXCEPTION);
+    SysFreeString(info.bstrDescription);
+    SysFreeString(info.bstrSource);
+    CHECK_HR(served->Invoke(1, IID_IDispatch, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr),
+             DISP_E_UNKNOWNINTERFACE);
+    CHECK_EQ(spans.entered, 5);
+    CHECK_EQ(spans.left, 5);
+    CHECK_EQ(spans.deepest, 1);
+    bridge.Observe(nullptr);
+    CHECK_HR(served->Invoke(1, IID_NULL, 0, DISPATCH_METHOD, &params, &result, nullptr, nullptr), S_OK);
+    VariantClear(&result);
+    CHECK_EQ(spans.entered, 5);
+  }
+  CHECK_EQ(locks.objects, 0L);
+}
+
 void PlatformOverWin32(const Paths& paths) {
   Group("the Win32 platform: resource component early- and late-bound, object creation, registry, files");
   kpx::win32::ServerLocks locks;
@@ -691,6 +824,17 @@ void PlatformOverWin32(const Paths& paths) {
                         kpx::platform::kRegDword);
   CHECK(kpx::RegistryQueryValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "number") ==
         kpx::Variant(int32_t{-5}));
+  // Values around the size read in one query, and past it, come back whole.
+  for (size_t length : {size_t{0}, size_t{255}, size_t{256}, size_t{4000}}) {
+    std::string text(length, 'x');
+    for (size_t i = 0; i < length; ++i) text[i] = static_cast<char>('a' + i % 26);
+    kpx::RegistrySetValue(world.registry, kpx::platform::RootKey::CurrentUser, key, "long", kpx::Variant(text),
+                          kpx::platform::kRegSz);
+    raw = world.registry.QueryValue(kpx::platform::RootKey::CurrentUser, key, "long");
+    CHECK(raw && raw->type == kpx::platform::kRegSz && raw->data == text + '\0');
+    if (!raw || raw->data != text + '\0') std::printf("  a value of %zu characters came back wrong\n", length);
+  }
+  CHECK(!world.registry.QueryValue(kpx::platform::RootKey::CurrentUser, key, "absent"));
   // Writing under a missing key creates nothing.
   CHECK(!world.registry.SetValue(kpx::platform::RootKey::CurrentUser, "Software\\kpxtest\\missing", "x",
                                  {kpx::platform::kRegSz, std::string("y\0", 2)}));
@@ -788,6 +932,7 @@ int main(int argc, char** argv) {
   std::printf("kpx-wintest: %s build\n", sizeof(void*) == 8 ? "x64" : "x86");
 
   RegistrationRoundTrip(paths);
+  SideBySideRegistration(paths);
 
   // Logging on for everything of the add-in, without time stamps, and the
   // "VisualStudio" add-in switched off; read once, when the add-in loads.
@@ -805,6 +950,7 @@ int main(int argc, char** argv) {
   ErrorsToTheHost();
   TokenScannerThroughIDispatch();
   BridgeAgainstHostObjects();
+  ObservedServing();
   PlatformOverWin32(paths);
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);

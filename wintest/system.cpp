@@ -63,6 +63,29 @@ std::set<std::wstring> SnapshotClassesRoot(const std::vector<std::wstring>& keys
   return out;
 }
 
+REGSAM OtherBuildsView() { return sizeof(void*) == 8 ? KEY_WOW64_32KEY : KEY_WOW64_64KEY; }
+
+bool HasOtherBuildsView() {
+  if (sizeof(void*) == 8) return true;
+  BOOL wow64 = FALSE;
+  return IsWow64Process(GetCurrentProcess(), &wow64) && wow64;
+}
+
+bool WriteDefault(HKEY root, const std::wstring& key, REGSAM view, const std::wstring& value) {
+  HKEY handle = nullptr;
+  if (RegCreateKeyExW(root, key.c_str(), 0, nullptr, REG_OPTION_NON_VOLATILE, KEY_ALL_ACCESS | view, nullptr, &handle,
+                      nullptr) != ERROR_SUCCESS)
+    return false;
+  LONG rc = RegSetValueExW(handle, nullptr, 0, REG_SZ, reinterpret_cast<const BYTE*>(value.c_str()),
+                           static_cast<DWORD>((value.size() + 1) * sizeof(wchar_t)));
+  RegCloseKey(handle);
+  return rc == ERROR_SUCCESS;
+}
+
+bool DeleteLeafKey(HKEY root, const std::wstring& key, REGSAM view) {
+  return RegDeleteKeyExW(root, key.c_str(), view, 0) == ERROR_SUCCESS;
+}
+
 bool WriteAnsiString(HKEY root, const char* key, const char* name, const char* value) {
   HKEY handle = nullptr;
   if (RegCreateKeyExA(root, key, 0, nullptr, REG_OPTION_NON_VOLATILE, KEY_ALL_ACCESS, nullptr, &handle, nullptr) !=

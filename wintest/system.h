@@ -17,6 +17,16 @@ DWORD Regsvr32(const std::wstring& dll, bool unregister);
 // ("key" and "key|name=type:data"); missing keys add nothing.
 std::set<std::wstring> SnapshotClassesRoot(const std::vector<std::wstring>& keys);
 
+// The registry view of the other build (32-bit for a 64-bit process and the
+// other way round), and whether this machine has one: 64-bit Windows.
+REGSAM OtherBuildsView();
+bool HasOtherBuildsView();
+
+// A key's default string value, creating the key, in the given view; and a
+// key without subkeys removed from that view.
+bool WriteDefault(HKEY root, const std::wstring& key, REGSAM view, const std::wstring& value);
+bool DeleteLeafKey(HKEY root, const std::wstring& key, REGSAM view);
+
 // Writes a value with the ANSI registry functions, creating the key.
 bool WriteAnsiString(HKEY root, const char* key, const char* name, const char* value);
 bool WriteAnsiDword(HKEY root, const char* key, const char* name, DWORD value);

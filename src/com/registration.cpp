@@ -21,14 +21,48 @@ bool SetString(HKEY root, const std::wstring& key, const wchar_t* name, const st
 
 void DeleteTree(HKEY root, const std::wstring& key) { RegDeleteTreeW(root, key.c_str()); RegDeleteKeyW(root, key.c_str()); }
 
-bool HasSubkeys(HKEY root, const std::wstring& key) {
+std::vector<std::wstring> Subkeys(HKEY root, const std::wstring& key) {
+  std::vector<std::wstring> out;
   HKEY handle = nullptr;
-  if (RegOpenKeyExW(root, key.c_str(), 0, KEY_READ, &handle) != ERROR_SUCCESS) return false;
-  DWORD subkeys = 0;
-  RegQueryInfoKeyW(handle, nullptr, nullptr, nullptr, &subkeys, nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
-                   nullptr);
+  if (RegOpenKeyExW(root, key.c_str(), 0, KEY_READ, &handle) != ERROR_SUCCESS) return out;
+  for (DWORD i = 0;; ++i) {
+    wchar_t name[256];
+    DWORD length = 256;
+    if (RegEnumKeyExW(handle, i, name, &length, nullptr, nullptr, nullptr, nullptr) != ERROR_SUCCESS) break;
+    out.emplace_back(name, length);
+  }
   RegCloseKey(handle);
-  return subkeys != 0;
+  return out;
+}
+
+// On 64-bit Windows the 32-bit and the 64-bit build each register in their
+// own view of HKCR\CLSID and HKCR\Interface, while ProgIDs and TypeLib are
+// one key for both views. This flag opens the other build's view (on 32-bit
+// Windows it is ignored, and the view is our own).
+constexpr REGSAM kOtherBuildsView = sizeof(void*) == 8 ? KEY_WOW64_32KEY : KEY_WOW64_64KEY;
+
+bool RegisteredInOtherView(const std::wstring& clsidKey) {
+  HKEY handle = nullptr;
+  if (RegOpenKeyExW(HKEY_CLASSES_ROOT, (clsidKey + L"\\InprocServer32").c_str(), 0, KEY_READ | kOtherBuildsView,
+                    &handle) != ERROR_SUCCESS)
+    return false;
+  RegCloseKey(handle);
+  return true;
+}
+
+const wchar_t* PlatformKey(SYSKIND kind) {
+  switch (kind) {
+    case SYS_WIN16: return L"win16";
+    case SYS_MAC: return L"mac";
+    case SYS_WIN64: return L"win64";
+    default: return L"win32";
+  }
+}
+
+std::wstring Hex(unsigned long value) {
+  wchar_t buf[16];
+  swprintf(buf, 16, L"%lx", value);
+  return buf;
 }
 
 std::wstring VersionKey(const TLIBATTR& attr) {
@@ -97,8 +131,10 @@ HRESULT RegisterServer(HINSTANCE module, std::span<const ClassRegistration> clas
 
 HRESULT UnregisterServer(HINSTANCE module, std::span<const ClassRegistration> classes) {
   for (const ClassRegistration& c : classes) {
-    DeleteTree(HKEY_CLASSES_ROOT, L"CLSID\\" + win32::GuidToWide(*c.clsid));
-    DeleteTree(HKEY_CLASSES_ROOT, c.progId);
+    const std::wstring clsidKey = L"CLSID\\" + win32::GuidToWide(*c.clsid);
+    DeleteTree(HKEY_CLASSES_ROOT, clsidKey);
+    // The other build, still registered, creates its object by this ProgID.
+    if (!RegisteredInOtherView(clsidKey)) DeleteTree(HKEY_CLASSES_ROOT, c.progId);
   }
 
   ITypeLib* lib = nullptr;
@@ -106,8 +142,10 @@ HRESULT UnregisterServer(HINSTANCE module, std::span<const ClassRegistration> cl
   TLIBATTR* attr = nullptr;
   if (SUCCEEDED(lib->GetLibAttr(&attr))) {
     // The system's own removal first; then whatever it leaves of the keys
-    // only this library writes: its interfaces, and its version under
-    // TypeLib (the library key itself only when no other version remains).
+    // only this library writes: its interfaces (in our view), and its
+    // platform under TypeLib. The version's other keys go only when no
+    // other platform (the other build) is registered under it, and the
+    // library key only when no other version remains.
     UnRegisterTypeLib(attr->guid, attr->wMajorVerNum, attr->wMinorVerNum, attr->lcid, attr->syskind);
     const UINT count = lib->GetTypeInfoCount();
     for (UINT i = 0; i < count; ++i) {
@@ -123,8 +161,15 @@ HRESULT UnregisterServer(HINSTANCE module, std::span<const ClassRegistration> cl
       info->Release();
     }
     const std::wstring libKey = L"TypeLib\\" + win32::GuidToWide(attr->guid);
-    DeleteTree(HKEY_CLASSES_ROOT, libKey + L"\\" + VersionKey(*attr));
-    if (!HasSubkeys(HKEY_CLASSES_ROOT, libKey)) DeleteTree(HKEY_CLASSES_ROOT, libKey);
+    const std::wstring versionKey = libKey + L"\\" + VersionKey(*attr);
+    const std::wstring localeKey = versionKey + L"\\" + Hex(attr->lcid);
+    DeleteTree(HKEY_CLASSES_ROOT, localeKey + L"\\" + PlatformKey(attr->syskind));
+    if (Subkeys(HKEY_CLASSES_ROOT, localeKey).empty()) DeleteTree(HKEY_CLASSES_ROOT, localeKey);
+    bool versionInUse = false;
+    for (const std::wstring& sub : Subkeys(HKEY_CLASSES_ROOT, versionKey))
+      versionInUse = versionInUse || (_wcsicmp(sub.c_str(), L"FLAGS") != 0 && _wcsicmp(sub.c_str(), L"HELPDIR") != 0);
+    if (!versionInUse) DeleteTree(HKEY_CLASSES_ROOT, versionKey);
+    if (Subkeys(HKEY_CLASSES_ROOT, libKey).empty()) DeleteTree(HKEY_CLASSES_ROOT, libKey);
     lib->ReleaseTLibAttr(attr);
   }
   lib->Release();

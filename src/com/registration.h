@@ -1,6 +1,9 @@
 // Self-registration of an in-process server: its classes under HKCR\CLSID,
 // their ProgIDs, and its embedded type library. Unregistering removes all
-// of it again, so that regsvr32 /u leaves the registry as it found it.
+// of it again, so that regsvr32 /u leaves the registry as it found it; on
+// 64-bit Windows, where the x86 and the x64 build may be registered side by
+// side, it leaves what the other build shares with it (the ProgIDs, the
+// type library's version key) while that build is registered.
 #pragma once
 
 #include "platform/win32/win32_api.h"

@@ -13,6 +13,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "automation/call_observer.h"
 #include "automation/object.h"
 #include "automation/variant.h"
 
@@ -60,6 +61,10 @@ class ComBridge {
 
   ServerLocks& locks() { return locks_; }
 
+  // Told of every call into an object this bridge serves (nullptr: none).
+  void Observe(CallObserver* observer) { observer_ = observer; }
+  CallObserver* observer() const { return observer_; }
+
   // Converts a value that came from COM (a by-reference VARIANT is read
   // through). Raises 13 for kinds the core does not know (arrays, ...).
   Variant FromCom(const VARIANT& in);
@@ -81,6 +86,7 @@ class ComBridge {
  private:
   ServerLocks& locks_;
   Describe describe_;
+  CallObserver* observer_ = nullptr;
   std::unordered_map<const Object*, ObjectDispatch*> exposed_;
 };
 

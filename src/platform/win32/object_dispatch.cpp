@@ -77,6 +77,7 @@ HRESULT ObjectDispatch::GetTypeInfo(UINT index, LCID, ITypeInfo** info) {
 }
 
 HRESULT ObjectDispatch::GetIDsOfNames(REFIID iid, LPOLESTR* names, UINT count, LCID, DISPID* ids) {
+  ObservedCall call(bridge_.observer());
   if (!IsEqualIID(iid, IID_NULL)) return DISP_E_UNKNOWNINTERFACE;
   if (!names || !ids || count == 0) return E_INVALIDARG;
   for (UINT i = 0; i < count; ++i) ids[i] = DISPID_UNKNOWN;
@@ -151,6 +152,7 @@ bool IsScalarResult(VARTYPE vt) {
 
 HRESULT ObjectDispatch::Invoke(DISPID id, REFIID iid, LCID, WORD flags, DISPPARAMS* params, VARIANT* result,
                                EXCEPINFO* excepInfo, UINT* argErr) {
+  ObservedCall call(bridge_.observer());
   if (!IsEqualIID(iid, IID_NULL)) return DISP_E_UNKNOWNINTERFACE;
   if (!params || (params->cArgs && !params->rgvarg)) return E_INVALIDARG;
   const ExposedType::Member* member = type_ ? type_->Find(id) : nullptr;

@@ -28,17 +28,20 @@ std::optional<platform::RegistryValue> Win32Registry::QueryValue(platform::RootK
   HKEY handle = nullptr;
   if (RegOpenKeyExA(RootHandle(root), ansiKey.c_str(), 0, kReadAccess, &handle) != ERROR_SUCCESS) return std::nullopt;
   std::optional<platform::RegistryValue> result;
+  // Most values fit a small buffer: one query then, where asking for the
+  // size first would take two (each a round trip to the registry's keeper).
+  // A larger value is read again into a buffer of its size.
   DWORD type = 0;
-  DWORD size = 0;
-  // Once for the type and size, then into a buffer of that size.
-  if (RegQueryValueExA(handle, ansiName.c_str(), nullptr, &type, nullptr, &size) == ERROR_SUCCESS) {
-    std::string data(size, '\0');
-    DWORD got = size;
-    if (RegQueryValueExA(handle, ansiName.c_str(), nullptr, &type, reinterpret_cast<BYTE*>(data.data()), &got) ==
-        ERROR_SUCCESS) {
-      data.resize(got);
-      result = platform::RegistryValue{type, std::move(data)};
-    }
+  std::string data(256, '\0');
+  DWORD size = static_cast<DWORD>(data.size());
+  LONG rc = RegQueryValueExA(handle, ansiName.c_str(), nullptr, &type, reinterpret_cast<BYTE*>(data.data()), &size);
+  if (rc == ERROR_MORE_DATA) {
+    data.assign(size, '\0');
+    rc = RegQueryValueExA(handle, ansiName.c_str(), nullptr, &type, reinterpret_cast<BYTE*>(data.data()), &size);
+  }
+  if (rc == ERROR_SUCCESS) {
+    data.resize(size);
+    result = platform::RegistryValue{type, std::move(data)};
   }
   RegCloseKey(handle);
   return result;
