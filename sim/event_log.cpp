@@ -5,7 +5,12 @@
 
 namespace kpx::sim {
 
-void EventLog::Add(EventJson event) { events_.push_back(std::move(event)); }
+void EventLog::Add(EventJson event) {
+  if (sink_)
+    sink_->Write(event);
+  else
+    events_.push_back(std::move(event));
+}
 
 void EventLog::NameObject(const Object* object, std::string label) { names_[object] = std::move(label); }
 
@@ -56,12 +61,13 @@ EventJson EventLog::Value(const Variant& value) const {
   return nullptr;
 }
 
+std::string JsonlLine(const EventJson& event) {
+  return event.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace) + '\n';
+}
+
 std::string EventLog::Jsonl() const {
   std::string out;
-  for (const EventJson& e : events_) {
-    out += e.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
-    out += '\n';
-  }
+  for (const EventJson& e : events_) out += JsonlLine(e);
   return out;
 }
 

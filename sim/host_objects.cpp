@@ -501,8 +501,8 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
     case id::kGetInheritRelations: {
       Read(kind, args);
       std::vector<ObjectPtr> items;
-      for (const auto& e : world_.elements())
-        if (e->kind() == "InheritRelation" && !e->removed() && e->def().client == key) items.push_back(e);
+      for (size_t i : world_.RelationsFrom(key))
+        if (const auto& e = world_.elements()[i]; e->kind() == "InheritRelation" && !e->removed()) items.push_back(e);
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".inherits", items, true));
     }
     case id::kDeleteInheritRel: {
@@ -542,8 +542,8 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       Read(kind, args, 2);
       const std::string_view relationKind = RelatedKind(args[1].toInt32());
       std::vector<ObjectPtr> items;
-      for (const auto& e : world_.elements())
-        if (!relationKind.empty() && e->kind() == relationKind && !e->removed() && e->def().supplier == key)
+      for (size_t i : world_.RelationsTo(key))
+        if (const auto& e = world_.elements()[i]; !relationKind.empty() && e->kind() == relationKind && !e->removed())
           if (auto client = world_.FindElement(e->def().client); client && client->kind() == "Class")
             items.push_back(client);
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".related", items, true));
@@ -610,8 +610,8 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       return def_.navigable;
     case simid::kAssociation:
       Read(kind, args);
-      for (const auto& e : world_.elements())
-        if (e->kind() == "Association" && (e->def().role1 == key || e->def().role2 == key)) return ObjectPtr(e);
+      if (const std::vector<size_t>& found = world_.AssociationsOf(key); !found.empty())
+        return ObjectPtr(world_.elements()[found.front()]);
       return Variant::Nothing();
     default:
       NoMember();

@@ -1,12 +1,13 @@
 // The simulator's input files are JSON written by hand. Every fault in them
-// must name its line, so each file is kept with an index from JSON pointers
-// to the lines where values and object keys start.
+// must name its line. Lines are found when a fault is reported, by walking
+// the text again to the value: an index of every value's line would cost
+// more memory than the parsed file itself, for answers needed once.
 #pragma once
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <initializer_list>
-#include <map>
 #include <nlohmann/json.hpp>
 #include <optional>
 #include <stdexcept>
@@ -34,14 +35,21 @@ class InputError : public std::runtime_error {
   std::string message_;
 };
 
-// One parsed JSON file and where each of its values starts.
+// One parsed JSON file, with its text for finding lines.
 class JsonSource {
  public:
-  // Parses `text`; a syntax error, a duplicate key or a top level that is
-  // not an object raises InputError at its line. `name` is how errors name
-  // the file.
+  // Lists and objects nest at most this deep. Deeper files are refused:
+  // the values are copied and written out by recursion later.
+  static constexpr size_t kMaxDepth = 512;
+  // Larger files are refused rather than read into memory.
+  static constexpr uintmax_t kMaxBytes = uintmax_t{1} << 30;
+
+  // Parses `text`; a syntax error, a number out of range, nesting deeper
+  // than kMaxDepth, a duplicate key or a top level that is not an object
+  // raises InputError at its line. `name` is how errors name the file.
   JsonSource(std::string name, std::string text);
-  // Reads and parses a file; an unreadable file is an InputError at line 0.
+  // Reads and parses a file; a file that cannot be read (a folder, a
+  // missing file, one larger than kMaxBytes) is an InputError at line 0.
   static JsonSource Load(const std::filesystem::path& file);
 
   const std::string& name() const { return name_; }
@@ -51,31 +59,40 @@ class JsonSource {
   // The line of the key that names the member at `pointer`; its value's line
   // for array elements and the root.
   int KeyLineOf(const std::string& pointer) const;
+  // The same for a value of this document, known by its place in memory.
+  int LineOfValue(const InputJson& value) const;
+  // The line of the key `key` of the object `object` of this document.
+  int KeyLineOfValue(const InputJson& object, std::string_view key) const;
+  // The lines of the elements of the list `list`, found in one walk.
+  std::vector<int> ElementLines(const InputJson& list) const;
+  // Every value in document order with its line and its key's line (the
+  // value's own for list elements and the root), in one walk: for checking
+  // the lines of a whole document at once.
+  void ForEachLine(const std::function<void(const InputJson& value, int line, int keyLine)>& each) const;
 
  private:
-  void Index();
+  // Where a value lies: at each level, the place of the member or element
+  // among its siblings.
+  using Route = std::vector<size_t>;
+  std::optional<Route> RouteOf(const std::string& pointer) const;
+  std::optional<Route> RouteTo(const InputJson* value) const;
+  // The line where the value at `route` starts, or with `key` its key's.
+  int LineAt(const Route& route, bool key) const;
   std::string name_;
   std::string text_;
   InputJson root_;
-  std::map<std::string, int> valueLines_;
-  std::map<std::string, int> keyLines_;
 };
 
-// Appends one reference token to a JSON pointer, escaped.
-std::string PointerAppend(const std::string& pointer, std::string_view token);
-
 // A value inside a JsonSource, for reading it with checks that name the
-// right line when they fail.
+// right line when they fail. Small: a large file makes millions.
 class Node {
  public:
-  Node(const JsonSource& source, const InputJson& value, std::string pointer)
-      : source_(&source), value_(&value), pointer_(std::move(pointer)) {}
-  static Node Root(const JsonSource& source) { return Node(source, source.root(), ""); }
+  Node(const JsonSource& source, const InputJson& value) : source_(&source), value_(&value) {}
+  static Node Root(const JsonSource& source) { return Node(source, source.root()); }
 
   const InputJson& json() const { return *value_; }
-  const std::string& pointer() const { return pointer_; }
   const JsonSource& source() const { return *source_; }
-  int line() const { return source_->LineOf(pointer_); }
+  int line() const { return source_->LineOfValue(*value_); }
 
   [[noreturn]] void Fail(const std::string& message) const;
   // A fault of the member `key` itself (an unknown or misplaced key).
@@ -112,7 +129,6 @@ class Node {
  private:
   const JsonSource* source_;
   const InputJson* value_;
-  std::string pointer_;
 };
 
 }  // namespace kpx::sim

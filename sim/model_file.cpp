@@ -2,36 +2,54 @@
 
 #include <algorithm>
 #include <cctype>
+#include <cmath>
 #include <limits>
 #include <tuple>
 
 #include "automation/automation_error.h"
 #include "automation/vb_strings.h"
 #include "sim/faults.h"
+#include "sim/windows_path.h"
 
 namespace kpx::sim {
 
-bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
-  return std::lexicographical_compare(a.begin(), a.end(), b.begin(), b.end(), [](char x, char y) {
-    return std::tolower(static_cast<unsigned char>(x)) < std::tolower(static_cast<unsigned char>(y));
-  });
-}
+bool NoCaseLess::operator()(std::string_view a, std::string_view b) const { return kpx::NoCaseLess()(a, b); }
 
 const MemberDef* CompanionDef::FindMember(std::string_view name) const {
   auto it = members.find(name);
   return it == members.end() ? nullptr : &it->second;
 }
 
+std::optional<size_t> ModelDef::PlaceOf(std::string_view key) const {
+  auto it = elementIndex_.find(key);
+  return it == elementIndex_.end() ? std::nullopt : std::optional<size_t>(it->second);
+}
+
 const ElementDef* ModelDef::FindElement(std::string_view key) const {
-  for (const ElementDef& e : elements)
-    if (e.key == key) return &e;
-  return nullptr;
+  std::optional<size_t> place = PlaceOf(key);
+  return place ? &elements[*place] : nullptr;
 }
 
 const AddInDef* ModelDef::FindAddIn(std::string_view id) const {
-  for (const AddInDef& a : addins)
-    if (a.id == id) return &a;
-  return nullptr;
+  auto it = addinIndex_.find(id);
+  return it == addinIndex_.end() ? nullptr : &addins[it->second];
+}
+
+void ModelDef::ReserveElements(size_t count) {
+  elements.reserve(count);
+  elementIndex_.reserve(count);
+}
+
+bool ModelDef::AddElement(ElementDef&& element) {
+  if (!elementIndex_.emplace(element.key, elements.size()).second) return false;
+  elements.push_back(std::move(element));
+  return true;
+}
+
+bool ModelDef::AddAddIn(AddInDef&& addin) {
+  if (!addinIndex_.emplace(addin.id, addins.size()).second) return false;
+  addins.push_back(std::move(addin));
+  return true;
 }
 
 const std::vector<std::string_view>& ElementKinds() {
@@ -73,6 +91,9 @@ std::optional<platform::RootKey> RootOf(std::string_view name) {
   return std::nullopt;
 }
 
+// The longest name of one key, as Windows allows.
+constexpr size_t kMaxKeyPart = 255;
+
 std::string DwordBytes(uint32_t u) {
   std::string data;
   for (int i = 0; i < 4; ++i) data.push_back(static_cast<char>((u >> (8 * i)) & 0xFF));
@@ -82,19 +103,25 @@ std::string DwordBytes(uint32_t u) {
 uint32_t DwordOf(const Node& n) {
   if (n.IsString()) {
     const std::string s = n.String();
-    std::string digits = s;
-    int base = 10;
+    std::string_view digits = s;
+    uint64_t base = 10;
     if (digits.size() > 2 && digits[0] == '0' && (digits[1] == 'x' || digits[1] == 'X')) {
-      digits = digits.substr(2);
+      digits.remove_prefix(2);
       base = 16;
     }
-    if (digits.empty() || !std::all_of(digits.begin(), digits.end(), [&](char c) {
-          return base == 16 ? std::isxdigit(static_cast<unsigned char>(c)) != 0
-                            : std::isdigit(static_cast<unsigned char>(c)) != 0;
-        }))
+    auto digit = [&](char c) -> int {
+      if (c >= '0' && c <= '9') return c - '0';
+      if (base == 16 && c >= 'a' && c <= 'f') return c - 'a' + 10;
+      if (base == 16 && c >= 'A' && c <= 'F') return c - 'A' + 10;
+      return -1;
+    };
+    if (digits.empty() || !std::all_of(digits.begin(), digits.end(), [&](char c) { return digit(c) >= 0; }))
       n.Fail("\"" + s + "\" is not a 32-bit number (write 4278190208 or \"0xff000080\")");
-    const unsigned long long v = std::stoull(digits.substr(0, 17), nullptr, base);
-    if (digits.size() > 16 || v > 0xFFFFFFFFull) n.Fail("\"" + s + "\" does not fit in 32 bits");
+    uint64_t v = 0;
+    for (char c : digits) {
+      v = v * base + static_cast<uint64_t>(digit(c));
+      if (v > 0xFFFFFFFFull) n.Fail("\"" + s + "\" does not fit in 32 bits");
+    }
     return static_cast<uint32_t>(v);
   }
   const int64_t v = n.Integer();
@@ -131,6 +158,22 @@ int DaysInMonth(int year, int month) {
   return month == 2 && leap ? 29 : kDays[month - 1];
 }
 
+// Key names as Windows takes them: parts between single backslashes, of
+// printable characters (no line break, which REGEDIT4 cannot write).
+void CheckKeyName(const Node& registry, const std::string& fullKey, std::string_view path) {
+  size_t start = 0;
+  for (;;) {
+    const size_t end = std::min(path.find('\\', start), path.size());
+    if (end == start) registry.FailKey(fullKey, "a registry key has an empty part (\"\\\\\" twice, or at an end)");
+    if (end - start > kMaxKeyPart)
+      registry.FailKey(fullKey, "a part of a registry key is longer than " + std::to_string(kMaxKeyPart) + " characters");
+    if (end == path.size()) break;
+    start = end + 1;
+  }
+  if (std::any_of(path.begin(), path.end(), [](char c) { return static_cast<unsigned char>(c) < 0x20; }))
+    registry.FailKey(fullKey, "a registry key holds a control character or a line break");
+}
+
 }  // namespace
 
 platform::RegistryValue ParseRegistryValue(const Node& n) {
@@ -150,6 +193,7 @@ std::pair<platform::RootKey, std::string> ParseRegistryKey(const Node& registry,
   if (!root || slash == std::string::npos || slash + 1 == fullKey.size())
     registry.FailKey(fullKey,
                      "a registry key is HKEY_LOCAL_MACHINE\\..., HKEY_CURRENT_USER\\..., HKLM\\... or HKCU\\...");
+  CheckKeyName(registry, fullKey, std::string_view(fullKey).substr(slash + 1));
   return {*root, fullKey.substr(slash + 1)};
 }
 
@@ -161,6 +205,8 @@ std::vector<RegistryEntry> ParseRegistry(const Node& node) {
     values.ExpectObject("an object of values");
     out.push_back(keyOnly);
     for (const auto& [name, value] : values.Members()) {
+      if (name.find_first_of(std::string_view("\r\n\0", 3)) != std::string::npos)
+        values.FailKey(name, "a value name holds a line break or a NUL, which the registry file cannot hold");
       RegistryEntry e = keyOnly;
       e.name = name == "@" ? "" : name;
       e.value = ParseRegistryValue(value);
@@ -195,11 +241,14 @@ ClockSetting ParseClock(const Node& node) {
         seconds += (s[i] - '0') * scale;
       }
     }
+    // Many decimals can round up to a whole day, which Timer never reads.
+    if (seconds >= 86400) tm->Fail("a time lies before 24:00:00");
     c.seconds = seconds;
   }
   if (auto st = node.Find("step")) {
     c.step = st->Number();
     if (*c.step < 0) st->Fail("the clock cannot step backwards");
+    if (*c.step > 86400) st->Fail("the clock steps at most one day (86400 seconds) at a time");
   }
   return c;
 }
@@ -224,8 +273,15 @@ void CheckValue(const Node& n, const ModelDef& model, const CompanionDef* owner,
     if (v < -32768 || v > 32767) inner.Fail("number out of the 16-bit range");
   } else if (form == "i4")
     inner.Int32();
-  else if (form == "r4" || form == "r8" || form == "date")
+  else if (form == "r4") {
+    if (std::abs(inner.Number()) > std::numeric_limits<float>::max()) inner.Fail("number out of the Single range");
+  } else if (form == "r8")
     inner.Number();
+  else if (form == "date") {
+    // 100-01-01 to the last moment of 9999-12-31, as a Date can hold.
+    const double d = inner.Number();
+    if (d < -657434.0 || d >= 2958466.0) inner.Fail("a date lies from -657434 (100-01-01) to 2958465.99 (9999-12-31)");
+  }
   else if (form == "bool")
     inner.Bool();
   else if (form == "null" || form == "nothing") {
@@ -258,9 +314,7 @@ class ModelReader {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
                       "resources", "resourceComponent", "model", "faults"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
-    if (auto n = root_.Find("files")) ReadFiles(*n);
-    if (auto n = root_.Find("folders"))
-      for (const Node& f : n->Elements()) m_.folders.push_back(Path(f));
+    ReadFilesAndFolders(root_.Find("files"), root_.Find("folders"));
     if (auto n = root_.Find("clock")) m_.clock = ParseClock(*n);
     if (auto n = root_.Find("application")) ReadApplication(*n);
     if (auto n = root_.Find("resources")) ReadResources(*n);
@@ -280,17 +334,24 @@ class ModelReader {
   }
 
  private:
-  static std::string Path(const Node& n) {
-    std::string p = n.String();
-    if (p.empty()) n.Fail("empty path");
-    return p;
-  }
-
-  void ReadFiles(const Node& n) {
-    for (const auto& [path, content] : n.Members()) {
-      if (path.empty()) n.FailKey(path, "empty path");
-      m_.files.emplace_back(path, content.String());
-    }
+  // Folders are made first, then files, as the run lays them out.
+  void ReadFilesAndFolders(const std::optional<Node>& files, const std::optional<Node>& folders) {
+    PathPlan plan;
+    if (folders)
+      for (const Node& f : folders->Elements()) {
+        const std::string path = f.String();
+        std::string fault = PathFault(path, false);
+        if (fault.empty()) fault = plan.MakeFolder(path);
+        if (!fault.empty()) f.Fail(fault);
+        m_.folders.push_back(path);
+      }
+    if (files)
+      for (const auto& [path, content] : files->Members()) {
+        std::string fault = PathFault(path, true);
+        if (fault.empty()) fault = plan.WriteFile(path);
+        if (!fault.empty()) files->FailKey(path, fault);
+        m_.files.emplace_back(path, content.String());
+      }
   }
 
   void ReadApplication(const Node& n) {
@@ -318,15 +379,16 @@ class ModelReader {
 
   void ReadResources(const Node& n) {
     for (const auto& [id, text] : n.Members()) {
-      size_t used = 0;
-      long v = 0;
-      try {
-        v = std::stol(id, &used);
-      } catch (...) {
-        used = 0;
+      // Digits with an optional minus; nothing else, not even blanks.
+      const std::string_view digits = std::string_view(id).substr(!id.empty() && id[0] == '-' ? 1 : 0);
+      int64_t v = 0;
+      bool ok = !digits.empty() && digits.size() <= 10;
+      for (char c : digits) {
+        ok = ok && c >= '0' && c <= '9';
+        if (ok) v = v * 10 + (c - '0');
       }
-      if (used == 0 || used != id.size() || v < std::numeric_limits<int32_t>::min() ||
-          v > std::numeric_limits<int32_t>::max())
+      if (id[0] == '-') v = -v;
+      if (!ok || v < std::numeric_limits<int32_t>::min() || v > std::numeric_limits<int32_t>::max())
         n.FailKey(id, "a resource is keyed by its string id, such as \"5030\"");
       m_.resources[static_cast<int32_t>(v)] = text.String();
     }
@@ -346,8 +408,11 @@ class ModelReader {
   void ReadModel(const Node& n) {
     n.ExpectKeys({"properties", "elements", "selection"});
     if (auto p = n.Find("properties")) m_.modelProperties = ReadProperties(*p);
-    if (auto e = n.Find("elements"))
-      for (const Node& element : e->Elements()) ReadElement(element, "");
+    if (auto e = n.Find("elements")) {
+      const std::vector<Node> elements = e->Elements();
+      m_.ReserveElements(CountElements(elements));
+      for (const Node& element : elements) ReadElement(element, "");
+    }
     for (const Reference& r : references_) CheckReference(r);
     CheckNesting();
     if (auto s = n.Find("selection"))
@@ -357,33 +422,49 @@ class ModelReader {
       }
   }
 
-  // A name that must denote an element of one of `kinds` (any kind when empty).
+  // A name that must denote an element of `kind` (any kind when empty).
   struct Reference {
     Node node;
-    std::vector<std::string_view> kinds;
+    std::string_view kind;
   };
 
-  void Refer(const Node& node, std::vector<std::string_view> kinds) { references_.push_back({node, std::move(kinds)}); }
-
-  void CheckReference(const Reference& r) const {
-    const std::string name = r.node.String();
-    const ElementDef* e = m_.FindElement(name);
-    if (!e) r.node.Fail("no element \"" + name + "\" in the model");
-    if (!r.kinds.empty() && std::find(r.kinds.begin(), r.kinds.end(), e->kind) == r.kinds.end()) {
-      std::string want;
-      for (std::string_view k : r.kinds) want += (want.empty() ? "" : " or ") + std::string(k);
-      r.node.Fail("\"" + name + "\" is a " + e->kind + ", not a " + want);
-    }
+  // Elements with their attributes and operations, to make room for once.
+  static size_t CountElements(const std::vector<Node>& elements) {
+    size_t count = elements.size();
+    for (const Node& e : elements)
+      if (e.IsObject())
+        for (const char* list : {"attributes", "operations"})
+          if (auto it = e.json().find(list); it != e.json().end() && it->is_array()) count += it->size();
+    return count;
   }
 
+  void Refer(const Node& node, std::string_view kind) { references_.push_back({node, kind}); }
+
+  void CheckReference(const Reference& r) const {
+    const std::string& name = r.node.json().is_string() ? r.node.json().get_ref<const std::string&>() : r.node.String();
+    const ElementDef* e = m_.FindElement(name);
+    if (!e) r.node.Fail("no element \"" + name + "\" in the model");
+    if (!r.kind.empty() && e->kind != r.kind)
+      r.node.Fail("\"" + name + "\" is a " + e->kind + ", not a " + std::string(r.kind));
+  }
+
+  // Following nestedIn must end: a class cannot enclose itself. Each class
+  // is followed once; a chain that reaches one already followed stops.
   void CheckNesting() const {
-    for (const ElementDef& e : m_.elements) {
-      // Following nestedIn must end: a class cannot enclose itself.
-      std::set<std::string> seen{e.key};
-      for (const ElementDef* c = &e; !c->nestedIn.empty();) {
-        c = m_.FindElement(c->nestedIn);
-        if (!seen.insert(c->key).second) nestedNodes_.at(e.key).Fail("classes nested in a circle");
+    enum class Mark : unsigned char { None, OnWay, Done };
+    std::vector<Mark> marks(m_.elements.size(), Mark::None);
+    std::vector<size_t> way;
+    for (size_t start = 0; start < m_.elements.size(); ++start) {
+      way.clear();
+      for (size_t at = start; marks[at] == Mark::None;) {
+        marks[at] = Mark::OnWay;
+        way.push_back(at);
+        const ElementDef& c = m_.elements[at];
+        if (c.nestedIn.empty()) break;
+        at = *m_.PlaceOf(c.nestedIn);
+        if (marks[at] == Mark::OnWay) nestedNodes_.at(start).Fail("classes nested in a circle");
       }
+      for (size_t i : way) marks[i] = Mark::Done;
     }
   }
 
@@ -424,7 +505,6 @@ class ModelReader {
     e.name = name.String();
     if (e.name.empty()) name.Fail("an element needs a name");
     e.key = owner.empty() ? e.name : owner + "." + e.name;
-    if (m_.FindElement(e.key)) name.Fail("a second element \"" + e.key + "\"");
     e.owner = owner;
     e.stereotype = n.StringOr("stereotype", "");
     e.displayName = n.StringOr("displayName", e.name);
@@ -433,13 +513,13 @@ class ModelReader {
 
     if (auto c = n.Find("components"))
       for (const Node& m : c->Elements()) {
-        Refer(m, {"Module"});
+        Refer(m, "Module");
         e.components.push_back(m.String());
       }
     if (auto nest = n.Find("nestedIn")) {
-      Refer(*nest, {"Class"});
+      Refer(*nest, "Class");
       e.nestedIn = nest->String();
-      nestedNodes_.emplace(e.key, *nest);
+      nestedNodes_.emplace(m_.elements.size(), *nest);
     }
     e.classKind = n.StringOr("classKind", e.classKind);
     if (auto p = n.Find("package")) {
@@ -449,7 +529,7 @@ class ModelReader {
     }
     for (const char* end : {"client", "supplier"})
       if (auto r = n.Find(end)) {
-        Refer(*r, {});
+        Refer(*r, "");
         (std::string_view(end) == "client" ? e.client : e.supplier) = r->String();
       }
     e.relationText = n.StringOr("relationText", e.client + " -> " + e.supplier);
@@ -459,18 +539,18 @@ class ModelReader {
     }
     for (const char* role : {"role1", "role2"})
       if (auto r = n.Find(role)) {
-        Refer(*r, {"Role"});
+        Refer(*r, "Role");
         (std::string_view(role) == "role1" ? e.role1 : e.role2) = r->String();
       }
     if (auto c = n.Find("class")) {
-      Refer(*c, {"Class"});
+      Refer(*c, "Class");
       e.roleClass = c->String();
     }
     e.navigable = n.BoolOr("navigable", false);
 
     const std::string key = e.key;
     const size_t index = m_.elements.size();
-    m_.elements.push_back(std::move(e));
+    if (!m_.AddElement(std::move(e))) name.Fail("a second element \"" + key + "\"");
     for (const char* list : {"attributes", "operations"}) {
       std::optional<Node> members = n.Find(list);
       if (!members) continue;
@@ -491,10 +571,13 @@ class ModelReader {
     for (const Node& a : list) {
       a.ExpectObject("an add-in");
       AddInDef def;
-      def.name = a.Member("name").String();
+      const Node name = a.Member("name");
+      def.name = name.String();
       const int k = ++seen[def.name];
       def.id = k == 1 ? def.name : def.name + "#" + std::to_string(k);
-      m_.addins.push_back(std::move(def));
+      const std::string id = def.id;
+      if (!m_.AddAddIn(std::move(def)))
+        name.Fail("two add-ins are called \"" + id + "\" (the k-th add-in of a name is called name#k)");
     }
     for (size_t i = 0; i < list.size(); ++i) ReadAddIn(list[i], m_.addins[i]);
   }
@@ -602,7 +685,7 @@ class ModelReader {
   Node root_;
   ModelDef m_;
   std::vector<Reference> references_;
-  std::map<std::string, Node> nestedNodes_;
+  std::unordered_map<size_t, Node> nestedNodes_;  // by the place of the element
   std::string kindForMembers_;
 };
 

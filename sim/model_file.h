@@ -11,6 +11,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -155,7 +156,7 @@ struct FaultsDef {
 };
 
 struct ModelDef {
-  std::vector<RegistryEntry> registry;
+  std::vector<RegistryEntry> registry;  // keys and value names as REGEDIT4 can write them
   std::vector<std::pair<std::string, std::string>> files;
   std::vector<std::string> folders;
   ClockSetting clock;
@@ -165,12 +166,30 @@ struct ModelDef {
   std::map<int32_t, std::string> resources;
   bool resourceRegistered = true;
   Properties modelProperties;
-  std::vector<ElementDef> elements;
+  std::vector<ElementDef> elements;  // added through AddElement, which keeps them findable
   std::vector<std::string> selection;
   FaultsDef faults;
 
   const ElementDef* FindElement(std::string_view key) const;
+  // Where the element is in `elements`.
+  std::optional<size_t> PlaceOf(std::string_view key) const;
   const AddInDef* FindAddIn(std::string_view id) const;
+  // Appends an element under its key; false, and nothing added, when the
+  // key is taken.
+  bool AddElement(ElementDef&& element);
+  void ReserveElements(size_t count);
+  // Appends an add-in under its id; false, and nothing added, when the id
+  // is taken.
+  bool AddAddIn(AddInDef&& addin);
+
+ private:
+  struct Hash {
+    using is_transparent = void;
+    size_t operator()(std::string_view s) const { return std::hash<std::string_view>{}(s); }
+  };
+  using Index = std::unordered_map<std::string, size_t, Hash, std::equal_to<>>;
+  Index elementIndex_;
+  Index addinIndex_;
 };
 
 // The element kinds the simulated host knows, as IdentifyClass names them.

@@ -5,6 +5,7 @@
 
 #include "addin/api_members.h"
 #include "automation/vb_strings.h"
+#include "sim/windows_path.h"
 
 namespace kpx::sim {
 
@@ -89,7 +90,10 @@ void ReadCall(const Node& n, const ModelDef& model, Action& a) {
   if (!member) name.Fail("the add-in has no member \"" + name.String() + "\"");
   a.member = member->name;
   a.kind = member->kind;
-  if (auto k = n.Find("kind")) a.kind = ReadKind(*k, false);
+  if (auto k = n.Find("kind")) {
+    a.kindGiven = true;
+    a.kind = ReadKind(*k, false);
+  }
   size_t required = 0;
   for (size_t i = 0; i < member->paramCount; ++i)
     if (!member->params[i].optional) required = i + 1;
@@ -114,17 +118,23 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   const Node root = Node::Root(source);
   root.ExpectKeys({"comment", "model", "actions"});
   Scenario s;
-  std::vector<Node> actions = root.Member("actions").Elements();
+  const Node list = root.Member("actions");
+  std::vector<Node> actions = list.Elements();
   s.implicitCreate = actions.empty() || !actions.front().IsObject() || !actions.front().json().contains("create") ||
                      actions.front().json().at("create").is_string();
   bool alive = s.implicitCreate;
   bool scanner = false, dictionary = false;  // the scenario's own objects made so far
+  const std::vector<int> lines = source.ElementLines(list.json());
+  // The files and folders as the steps meet them, after the model's.
+  PathPlan plan;
+  for (const std::string& folder : model.folders) plan.MakeFolder(folder);
+  for (const auto& [path, content] : model.files) plan.WriteFile(path);
 
-  for (const Node& n : actions) {
+  for (size_t i = 0; i < actions.size(); ++i) {
+    const Node& n = actions[i];
     n.ExpectObject("an action");
     Action a;
-    a.line = n.line();
-    a.raw = n.json();
+    a.line = i < lines.size() ? lines[i] : 0;
     std::string which;
     for (const auto& [key, value] : n.Members()) {
       if (key == "comment" || key == "args" || key == "kind") continue;
@@ -171,6 +181,7 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       }
     } else {
       n.ExpectKeys({"comment", std::string_view(which)});
+      a.raw = n.json();
       if (which == "select") {
         a.type = Action::Type::Select;
         for (const Node& item : body.Elements()) {
@@ -197,7 +208,9 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
       } else {
         a.type = Action::Type::SetFile;
         for (const auto& [path, content] : body.Members()) {
-          if (path.empty()) body.FailKey(path, "empty path");
+          std::string fault = PathFault(path, true);
+          if (fault.empty()) fault = content.IsNull() ? plan.RemoveFile(path) : plan.WriteFile(path);
+          if (!fault.empty()) body.FailKey(path, fault);
           a.files.emplace_back(path, content.IsNull() ? std::nullopt : std::optional<std::string>(content.String()));
         }
       }

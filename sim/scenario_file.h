@@ -19,12 +19,14 @@ struct Action {
   enum class Type { Call, Select, Answer, Clock, Release, Create, SetRegistry, SetFile, Use };
   Type type = Type::Call;
   int line = 0;
-  InputJson raw;  // as written, for the log
+  InputJson raw;  // a change of the world as written, for the log; not kept for calls
 
-  // Call: the member's name as the add-in spells it, how it is called, and
-  // the arguments (checked values, possibly {"byref": ...}).
+  // Call: the member's name as the add-in spells it, how it is called
+  // (and whether the scenario said so), and the arguments (checked values,
+  // possibly {"byref": ...}).
   std::string member;
   CallKind kind = CallKind::Method;
+  bool kindGiven = false;
   std::vector<InputJson> args;
 
   // Create: what is made ("" the add-in object). Use: which of the

@@ -1,5 +1,7 @@
 #include "sim/sim_platform.h"
 
+#include <algorithm>
+#include <chrono>
 #include <cmath>
 #include <fstream>
 #include <stdexcept>
@@ -12,13 +14,6 @@ namespace kpx::sim {
 // ------------------------------------------------------------------- clock
 
 namespace {
-
-bool IsLeap(int y) { return (y % 4 == 0 && y % 100 != 0) || y % 400 == 0; }
-
-int DaysIn(int year, int month) {
-  static constexpr int kDays[] = {31, 28, 31, 30, 31, 30, 31, 31, 30, 31, 30, 31};
-  return month == 2 && IsLeap(year) ? 29 : kDays[month - 1];
-}
 
 constexpr double kDay = 86400.0;
 
@@ -56,18 +51,28 @@ platform::DateTime VirtualClock::Now() {
   return t;
 }
 
+// Whole days at once, so that a long step costs no more than a short one.
+// The clock stops at the last second of 9999-12-31, the last a Date holds.
 void VirtualClock::Advance(double seconds) {
+  using namespace std::chrono;
   seconds_ += seconds;
-  while (seconds_ >= kDay) {  // past midnight: Timer starts again from 0
-    seconds_ -= kDay;
-    if (++date_.day > DaysIn(date_.year, date_.month)) {
-      date_.day = 1;
-      if (++date_.month > 12) {
-        date_.month = 1;
-        ++date_.year;
-      }
-    }
+  if (seconds_ < kDay) return;
+  const double days = std::floor(seconds_ / kDay);
+  seconds_ = std::max(0.0, seconds_ - days * kDay);
+  const sys_days today = year_month_day{year{date_.year}, month{static_cast<unsigned>(date_.month)},
+                                        day{static_cast<unsigned>(date_.day)}};
+  const sys_days last = year_month_day{year{9999}, December, day{31}};
+  if (days > static_cast<double>((last - today).count())) {
+    date_.year = 9999;
+    date_.month = 12;
+    date_.day = 31;
+    seconds_ = kDay - 1;
+    return;
   }
+  const year_month_day then{today + std::chrono::days{static_cast<int>(days)}};
+  date_.year = static_cast<int>(then.year());
+  date_.month = static_cast<int>(static_cast<unsigned>(then.month()));
+  date_.day = static_cast<int>(static_cast<unsigned>(then.day()));
 }
 
 void RecordingClock::Sleep(uint32_t milliseconds) {
@@ -186,9 +191,9 @@ void SeedRegistry(platform::Registry& registry, const std::vector<RegistryEntry>
   for (const RegistryEntry& e : entries) {
     if (!e.name) {
       if (registry.CreateKey(e.root, e.key) == platform::KeyDisposition::Failed)
-        throw std::runtime_error("cannot create registry key " + RootName(e.root) + "\\" + e.key);
+        throw WorldError("cannot create registry key " + RootName(e.root) + "\\" + e.key);
     } else if (!registry.SetValue(e.root, e.key, *e.name, e.value)) {
-      throw std::runtime_error("cannot set registry value " + RootName(e.root) + "\\" + e.key + " " + *e.name);
+      throw WorldError("cannot set registry value " + RootName(e.root) + "\\" + e.key + " " + *e.name);
     }
   }
 }
@@ -219,19 +224,64 @@ bool RecordingFileSystem::AppendText(std::string_view path, std::string_view tex
   return ok;
 }
 
+namespace {
+
+// Where the file system's refusal is the sim's failure to change the world.
+template <typename F>
+void Seeding(std::string_view windowsPath, const char* what, F change) {
+  try {
+    change();
+  } catch (const std::filesystem::filesystem_error& e) {
+    throw WorldError(std::string("cannot ") + what + " " + std::string(windowsPath) + ": " + e.code().message());
+  }
+}
+
+// Refuses a path below a file, in the same words on every system.
+void CheckFolders(std::string_view windowsPath, const std::filesystem::path& path, const char* what) {
+  for (std::filesystem::path up = path.parent_path(); !up.empty(); up = up.parent_path()) {
+    const std::filesystem::file_status status = std::filesystem::status(up);
+    if (std::filesystem::exists(status)) {
+      if (!std::filesystem::is_directory(status))
+        throw WorldError(std::string("cannot ") + what + " " + std::string(windowsPath) +
+                         ": a file lies where a folder must be");
+      return;
+    }
+    if (up == up.root_path()) return;
+  }
+}
+
+}  // namespace
+
 void FileSeeder::MakeFolder(std::string_view windowsPath) {
-  std::filesystem::create_directories(hostPath_(windowsPath));
+  Seeding(windowsPath, "make the folder", [&] {
+    const std::filesystem::path path = hostPath_(windowsPath);
+    CheckFolders(windowsPath, path / "x", "make the folder");  // the folder itself too
+    std::filesystem::create_directories(path);
+  });
 }
 
 void FileSeeder::WriteFile(std::string_view windowsPath, std::string_view content) {
-  const std::filesystem::path path = hostPath_(windowsPath);
-  if (path.has_parent_path()) std::filesystem::create_directories(path.parent_path());
-  std::ofstream out(path, std::ios::binary | std::ios::trunc);
-  out.write(content.data(), static_cast<std::streamsize>(content.size()));
-  if (!out) throw std::runtime_error("cannot write " + std::string(windowsPath) + " (" + path.string() + ")");
+  Seeding(windowsPath, "write", [&] {
+    const std::filesystem::path path = hostPath_(windowsPath);
+    CheckFolders(windowsPath, path, "write");
+    if (path.has_parent_path()) std::filesystem::create_directories(path.parent_path());
+    if (std::filesystem::is_directory(path))
+      throw WorldError("cannot write " + std::string(windowsPath) + ": a folder of that name is in the way");
+    std::ofstream out(path, std::ios::binary | std::ios::trunc);
+    out.write(content.data(), static_cast<std::streamsize>(content.size()));
+    out.close();
+    if (!out) throw WorldError("cannot write " + std::string(windowsPath) + " (" + path.string() + ")");
+  });
 }
 
-void FileSeeder::RemoveFile(std::string_view windowsPath) { std::filesystem::remove(hostPath_(windowsPath)); }
+void FileSeeder::RemoveFile(std::string_view windowsPath) {
+  Seeding(windowsPath, "delete", [&] {
+    const std::filesystem::path path = hostPath_(windowsPath);
+    if (std::filesystem::is_directory(path))
+      throw WorldError("cannot delete " + std::string(windowsPath) + ": it is a folder");
+    std::filesystem::remove(path);
+  });
+}
 
 // ----------------------------------------------------------------- objects
 

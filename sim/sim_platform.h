@@ -10,6 +10,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <stdexcept>
 #include <string>
 
 #include "platform/platform.h"
@@ -101,8 +102,14 @@ std::string RootName(platform::RootKey root);
 EventJson RegistryValueJson(const platform::RegistryValue& value);
 std::string RegistryTypeName(uint32_t type);
 
+// A change to the world that the registry or the file system refused.
+class WorldError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
 // Puts registry entries in place through the plain interface: the key is
-// created, then the value set. Nothing is recorded.
+// created, then the value set. Nothing is recorded. Raises WorldError.
 void SeedRegistry(platform::Registry& registry, const std::vector<RegistryEntry>& entries);
 
 // ------------------------------------------------------------------- files
@@ -137,7 +144,8 @@ class RecordingFileSystem final : public platform::FileSystem {
 
 // Lays out the model's folders and files before the run. The platform's
 // file interface only appends and deletes, so this is the sim's own door:
-// `hostPath` maps a Windows path to where it really lies.
+// `hostPath` maps a Windows path to where it really lies. Each raises
+// WorldError when the file system refuses.
 class FileSeeder {
  public:
   explicit FileSeeder(std::function<std::filesystem::path(std::string_view)> hostPath)
@@ -145,6 +153,7 @@ class FileSeeder {
   void MakeFolder(std::string_view windowsPath);
   // Replaces the file with exactly `content`, making its folder if needed.
   void WriteFile(std::string_view windowsPath, std::string_view content);
+  // Deletes a file; nothing there is no fault, a folder there is.
   void RemoveFile(std::string_view windowsPath);
 
  private:

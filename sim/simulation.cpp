@@ -1,5 +1,7 @@
 #include "sim/simulation.h"
 
+#include <stdexcept>
+
 #include "automation/dictionary.h"
 #include "automation/error_styles.h"
 #include "shared/token_scanner_object.h"
@@ -37,7 +39,7 @@ Simulation::~Simulation() {
 void Simulation::Prepare() {
   if (prepared_) return;
   prepared_ = true;
-  SeedRegistry(env_.registry, model_.registry);
+  SeedRegistry(model_.registry);
   // Every Windows machine has a drive C, files or not: a debug log at its
   // root ("C:\tzndebuglog.txt", the logger's default) can be written.
   env_.seeder.MakeFolder("C:\\");
@@ -46,10 +48,25 @@ void Simulation::Prepare() {
   clock_.Set(model_.clock);
 }
 
+void Simulation::SeedRegistry(const std::vector<RegistryEntry>& entries) {
+  if (env_.batchRegistry)
+    env_.batchRegistry([&] { kpx::sim::SeedRegistry(env_.registry, entries); });
+  else
+    kpx::sim::SeedRegistry(env_.registry, entries);
+}
+
 void Simulation::Run(const Scenario& scenario) {
+  auto stepDone = [this] {
+    log_.Flush();
+    if (log_.broken()) throw std::runtime_error("the output cannot be written");
+  };
   Prepare();
   if (scenario.implicitCreate) Create();
-  for (const Action& action : scenario.actions) Apply(action);
+  stepDone();
+  for (const Action& action : scenario.actions) {
+    Apply(action);
+    stepDone();
+  }
   if (api_) Release(true);
   if (!ui_.pendingAnswers().empty())
     log_.Add({{"ev", "unused-answers"},
@@ -84,6 +101,12 @@ void Simulation::Apply(const Action& a) {
     ev[key] = EventJson::parse(a.raw.at(key).dump());
     log_.Add(std::move(ev));
   };
+  // What the world refused, after the step as written.
+  std::vector<std::string> refused;
+  auto logFailures = [&](const char* action) {
+    for (const std::string& reason : refused)
+      log_.Add({{"ev", "world-failed"}, {"action", action}, {"line", a.line}, {"reason", reason}});
+  };
   switch (a.type) {
     case Action::Type::Call:
       Call(a);
@@ -113,17 +136,27 @@ void Simulation::Apply(const Action& a) {
       logWorld("clock");
       break;
     case Action::Type::SetRegistry:
-      SeedRegistry(env_.registry, a.registry);
+      try {
+        SeedRegistry(a.registry);
+      } catch (const WorldError& e) {
+        refused.push_back(e.what());
+      }
       logWorld("setRegistry");
+      logFailures("setRegistry");
       break;
     case Action::Type::SetFile:
       for (const auto& [path, content] : a.files) {
-        if (content)
-          env_.seeder.WriteFile(path, *content);
-        else
-          env_.seeder.RemoveFile(path);
+        try {
+          if (content)
+            env_.seeder.WriteFile(path, *content);
+          else
+            env_.seeder.RemoveFile(path);
+        } catch (const WorldError& e) {
+          refused.push_back(e.what());
+        }
       }
       logWorld("setFile");
+      logFailures("setFile");
       break;
   }
 }
@@ -151,7 +184,7 @@ void Simulation::Call(const Action& a) {
     }
   }
   EventJson call{{"ev", "call"}, {"member", a.member}, {"args", std::move(shown)}};
-  if (a.raw.contains("kind")) call["kind"] = a.kind == CallKind::PropertyGet ? "get" : "method";
+  if (a.kindGiven) call["kind"] = a.kind == CallKind::PropertyGet ? "get" : "method";
   log_.Add(std::move(call));
 
   const uint64_t before = log_.hostCalls();

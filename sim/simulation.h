@@ -18,12 +18,18 @@
 
 namespace kpx::sim {
 
+// Runs `seed`, which puts many registry values in place, so that the
+// registry may write them out once: one that writes itself to a file after
+// every change would write the whole file once per value.
+using RegistryBatch = std::function<void(const std::function<void()>& seed)>;
+
 // What a run is given from outside: the native build hands in a registry
 // file and a sandbox; a Windows test host would hand in the real ones.
 struct Environment {
   platform::Registry& registry;
   platform::FileSystem& files;
   FileSeeder& seeder;
+  RegistryBatch batchRegistry = {};  // none: values are set one by one
 };
 
 // How the add-in object is made. The default makes it in this process on
@@ -53,7 +59,9 @@ class Simulation {
   // Run() does it first; tests that drive the world by hand call it.
   void Prepare();
   // Prepares, then plays the scenario. Releases the add-in object at the
-  // end if the scenario left it alive. Once per simulation.
+  // end if the scenario left it alive. Once per simulation. The log is
+  // flushed after each step; a log whose sink broke stops the run
+  // (std::runtime_error).
   void Run(const Scenario& scenario);
 
   const EventLog& log() const { return log_; }
@@ -64,13 +72,17 @@ class Simulation {
   // process's own (made by another factory).
   std::shared_ptr<API> api() const { return std::dynamic_pointer_cast<API>(api_); }
 
-  // The single steps of a scenario.
+  // The single steps of a scenario. A change of the world that fails (a
+  // file where a scenario writes a folder's file, after the add-in made
+  // it) is logged as "world-failed" with the step's line, and the run
+  // goes on.
   void Create();
   void Release(bool implicit);
   void Apply(const Action& action);
 
  private:
   void Call(const Action& action);
+  void SeedRegistry(const std::vector<RegistryEntry>& entries);
   void MakeObject(const Action& action);
   void Use(const Action& action);
 

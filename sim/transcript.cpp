@@ -191,85 +191,122 @@ std::string TranscriptLine(const EventJson& e) {
     for (const auto& [key, value] : e.items())
       if (key != "ev") return Line("world", key + " " + value.dump());
   }
+  if (ev == "world-failed")
+    return Line("world", Str(e, "action") + " of line " + Str(e, "line") + " FAILED: " + Str(e, "reason"));
+  if (ev == "aborted") return Line("ABORTED", "the run stopped here: " + Str(e, "reason"));
   if (ev == "unused-answers") return Line("world", "answers never used: " + F(e, "buttons").dump());
   return Line(ev.c_str(), e.dump());
 }
 
-std::string Transcript(const std::vector<EventJson>& events, const std::string& title) {
-  std::ostringstream out;
-  out << title << "\n\n";
-  // Members in the order of their first call.
-  std::vector<std::string> members;
-  std::map<std::string, uint64_t> calls, hostCalls, errors;
-  std::vector<std::string> addins, debugLines;
-  uint64_t regRead = 0, regMissing = 0, regWritten = 0, keysCreated = 0, hostLog = 0, companionCalls = 0, deletes = 0,
-           appends = 0, objects = 0, failedObjects = 0, debugFailed = 0, faults = 0;
-  for (const EventJson& e : events) {
-    out << TranscriptLine(e) << '\n';
-    const std::string ev = Str(e, "ev"), member = Str(e, "member");
-    if (ev == "fault" || e.value("fault", false)) ++faults;
-    if (ev == "call") {
-      if (!calls.count(member)) members.push_back(member);
-      ++calls[member];
-    } else if (ev == "result" || ev == "error") {
-      hostCalls[member] += Count(F(e, "hostCalls"));
-      if (ev == "error") ++errors[member];
-    } else if (ev == "addin") {
-      addins.push_back(Str(e, "addin") + "." + Str(e, "action"));
-    } else if (ev == "registry-read") {
-      ++regRead;
-      if (F(e, "value").is_null()) ++regMissing;
-    } else if (ev == "registry-write") {
-      if (e.value("written", false)) ++regWritten;
-    } else if (ev == "registry-create") {
-      ++keysCreated;
-    } else if (ev == "hostlog") {
-      ++hostLog;
-    } else if (ev == "companion-call") {
-      ++companionCalls;
-    } else if (ev == "file-delete") {
-      if (e.value("ok", false)) ++deletes;
-    } else if (ev == "file-append") {
-      ++appends;
-    } else if (ev == "object-create") {
-      ++(e.value("ok", false) ? objects : failedObjects);
-    } else if (ev == "debuglog") {
-      if (e.value("ok", false))
-        debugLines.push_back(Str(e, "line"));
-      else
-        ++debugFailed;
+SpillList::SpillList() : file_(std::tmpfile()) {}
+
+SpillList::~SpillList() {
+  if (file_) std::fclose(file_);
+}
+
+void SpillList::Add(const std::string& text) {
+  ++size_;
+  if (file_ && memory_.empty()) {
+    const uint64_t length = text.size();
+    if (std::fwrite(&length, sizeof length, 1, file_) == 1 &&
+        std::fwrite(text.data(), 1, text.size(), file_) == text.size()) {
+      ++inFile_;
+      return;
     }
   }
+  // No temporary file, or it failed (a full disk): the rest stays in memory.
+  memory_.push_back(text);
+}
 
+TranscriptWriter::TranscriptWriter(std::ostream& out, const std::string& title) : out_(out) {
+  out_ << title << "\n\n";
+}
+
+void TranscriptWriter::Write(const EventJson& e) {
+  out_ << TranscriptLine(e) << '\n';
+  const std::string ev = Str(e, "ev"), member = Str(e, "member");
+  if (ev == "fault" || e.value("fault", false)) ++faults_;
+  if (ev == "call") {
+    if (!calls_.count(member)) members_.push_back(member);
+    ++calls_[member];
+  } else if (ev == "result" || ev == "error") {
+    hostCalls_[member] += Count(F(e, "hostCalls"));
+    if (ev == "error") ++errors_[member];
+  } else if (ev == "addin") {
+    addins_.Add(Str(e, "addin") + "." + Str(e, "action"));
+  } else if (ev == "registry-read") {
+    ++regRead_;
+    if (F(e, "value").is_null()) ++regMissing_;
+  } else if (ev == "registry-write") {
+    if (e.value("written", false)) ++regWritten_;
+  } else if (ev == "registry-create") {
+    ++keysCreated_;
+  } else if (ev == "hostlog") {
+    ++hostLog_;
+  } else if (ev == "companion-call") {
+    ++companionCalls_;
+  } else if (ev == "file-delete") {
+    if (e.value("ok", false)) ++deletes_;
+  } else if (ev == "file-append") {
+    ++appends_;
+  } else if (ev == "object-create") {
+    ++(e.value("ok", false) ? objects_ : failedObjects_);
+  } else if (ev == "debuglog") {
+    if (e.value("ok", false))
+      debugLines_.Add(Str(e, "line"));
+    else
+      ++debugFailed_;
+  }
+}
+
+void TranscriptWriter::Finish() {
   auto row = [&](const char* label, const std::string& text) {
     char head[32];
     std::snprintf(head, sizeof head, "  %-16s ", label);
-    out << head << text << '\n';
+    out_ << head << text << '\n';
   };
   auto perMember = [&](const std::map<std::string, uint64_t>& counts) {
     std::string text;
-    for (const std::string& m : members)
+    for (const std::string& m : members_)
       if (counts.count(m)) text += (text.empty() ? "" : ", ") + m + " " + std::to_string(counts.at(m));
     return text.empty() ? std::string("none") : text;
   };
-  out << "\nsummary\n";
-  row("members called", perMember(calls));
-  row("host calls", perMember(hostCalls));
-  row("raised to host", perMember(errors));
-  std::string activated;
-  for (const std::string& a : addins) activated += (activated.empty() ? "" : ", ") + a;
-  row("add-ins", activated.empty() ? "untouched" : activated);
-  row("registry", Plural(regRead, "value read", "values read") + " (" + std::to_string(regMissing) + " missing), " +
-                      Plural(regWritten, "value written", "values written") + ", " +
-                      Plural(keysCreated, "key created or opened", "keys created or opened"));
-  row("objects", Plural(objects, "created", "created") + ", " + std::to_string(failedObjects) + " failed, " +
-                     Plural(companionCalls, "companion call", "companion calls"));
-  row("files", Plural(deletes, "deleted", "deleted") + ", " + Plural(appends, "other append", "other appends"));
-  row("host log", Plural(hostLog, "line", "lines"));
-  if (faults) row("faults", Plural(faults, "injected failure met", "injected failures met"));
-  row("debug log", Plural(debugLines.size(), "line written", "lines written") +
-                       (debugFailed ? ", " + Plural(debugFailed, "write failed", "writes failed") : ""));
-  for (const std::string& line : debugLines) out << "    " << line << '\n';
+  out_ << "\nsummary\n";
+  row("members called", perMember(calls_));
+  row("host calls", perMember(hostCalls_));
+  row("raised to host", perMember(errors_));
+  if (addins_.size() == 0) {
+    row("add-ins", "untouched");
+  } else {
+    char head[32];
+    std::snprintf(head, sizeof head, "  %-16s ", "add-ins");
+    out_ << head;
+    bool first = true;
+    addins_.ForEach([&](const std::string& a) {
+      out_ << (first ? "" : ", ") << a;
+      first = false;
+    });
+    out_ << '\n';
+  }
+  row("registry", Plural(regRead_, "value read", "values read") + " (" + std::to_string(regMissing_) + " missing), " +
+                      Plural(regWritten_, "value written", "values written") + ", " +
+                      Plural(keysCreated_, "key created or opened", "keys created or opened"));
+  row("objects", Plural(objects_, "created", "created") + ", " + std::to_string(failedObjects_) + " failed, " +
+                     Plural(companionCalls_, "companion call", "companion calls"));
+  row("files", Plural(deletes_, "deleted", "deleted") + ", " + Plural(appends_, "other append", "other appends"));
+  row("host log", Plural(hostLog_, "line", "lines"));
+  if (faults_) row("faults", Plural(faults_, "injected failure met", "injected failures met"));
+  row("debug log", Plural(debugLines_.size(), "line written", "lines written") +
+                       (debugFailed_ ? ", " + Plural(debugFailed_, "write failed", "writes failed") : ""));
+  debugLines_.ForEach([&](const std::string& line) { out_ << "    " << line << '\n'; });
+  out_.flush();
+}
+
+std::string Transcript(const std::vector<EventJson>& events, const std::string& title) {
+  std::ostringstream out;
+  TranscriptWriter writer(out, title);
+  for (const EventJson& e : events) writer.Write(e);
+  writer.Finish();
   return out.str();
 }
 

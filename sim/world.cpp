@@ -16,7 +16,24 @@ World::World(const ModelDef& def, EventLog& log)
   application_ = std::make_shared<ApplicationObject>(*this, def.application,
                                                      std::make_shared<AddInManagerObject>(*this, collection));
   model_ = std::make_shared<ModelObject>(*this);
-  for (const ElementDef& e : def.elements) elements_.push_back(std::make_shared<ElementObject>(*this, e));
+  elements_.reserve(def.elements.size());
+  for (size_t i = 0; i < def.elements.size(); ++i) {
+    const ElementDef& e = def.elements[i];
+    elements_.push_back(std::make_shared<ElementObject>(*this, e));
+    if (IsRelationKind(e.kind)) {
+      relationsFrom_[e.client].push_back(i);
+      relationsTo_[e.supplier].push_back(i);
+    } else if (e.kind == "Association") {
+      associationsOf_[e.role1].push_back(i);
+      if (e.role2 != e.role1) associationsOf_[e.role2].push_back(i);
+    }
+  }
+}
+
+const std::vector<size_t>& World::Listed(const Places& places, std::string_view key) {
+  static const std::vector<size_t> kNone;
+  auto it = places.find(key);
+  return it == places.end() ? kNone : it->second;
 }
 
 World::~World() = default;
@@ -24,15 +41,13 @@ World::~World() = default;
 ObjectPtr World::application() const { return application_; }
 
 std::shared_ptr<ElementObject> World::FindElement(std::string_view key) const {
-  for (const auto& e : elements_)
-    if (e->def().key == key) return e;
-  return nullptr;
+  const std::optional<size_t> place = def_.PlaceOf(key);
+  return place ? elements_[*place] : nullptr;
 }
 
 std::shared_ptr<AddInObject> World::FindAddIn(std::string_view id) const {
-  for (const auto& a : addins_)
-    if (a->def().id == id) return a;
-  return nullptr;
+  const AddInDef* a = def_.FindAddIn(id);
+  return a ? addins_[static_cast<size_t>(a - def_.addins.data())] : nullptr;
 }
 
 std::vector<ObjectPtr> World::SelectedItems() const {

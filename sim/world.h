@@ -7,6 +7,7 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
 #include "automation/variant.h"
@@ -42,6 +43,13 @@ class World {
   std::shared_ptr<AddInObject> FindAddIn(std::string_view id) const;
   const std::vector<std::shared_ptr<AddInObject>>& addins() const { return addins_; }
 
+  // Relations by their client and by their supplier, associations by their
+  // roles: places in elements(), in model order. A class's menu asks for
+  // them on every right click; a large model cannot be searched each time.
+  const std::vector<size_t>& RelationsFrom(std::string_view client) const { return Listed(relationsFrom_, client); }
+  const std::vector<size_t>& RelationsTo(std::string_view supplier) const { return Listed(relationsTo_, supplier); }
+  const std::vector<size_t>& AssociationsOf(std::string_view role) const { return Listed(associationsOf_, role); }
+
   // The model's selection, as element keys (checked by the caller).
   void Select(std::vector<std::string> keys) { selection_ = std::move(keys); }
   std::vector<ObjectPtr> SelectedItems() const;
@@ -56,6 +64,9 @@ class World {
   std::string NextLabel(const std::string& base);
 
  private:
+  using Places = std::unordered_map<std::string_view, std::vector<size_t>>;
+  static const std::vector<size_t>& Listed(const Places& places, std::string_view key);
+
   const ModelDef& def_;
   EventLog& log_;
   CallFaults faults_;
@@ -65,6 +76,7 @@ class World {
   std::vector<std::shared_ptr<AddInObject>> addins_;
   std::vector<std::string> selection_;
   std::map<std::string, int> instances_;
+  Places relationsFrom_, relationsTo_, associationsOf_;  // keys are views of def_'s names
 };
 
 }  // namespace kpx::sim

@@ -266,6 +266,41 @@ TEST(FileRegistry, CreateKeyReportsCreatedThenOpened) {
   EXPECT_TRUE(*memory.QueryValue(RootKey::CurrentUser, "k", "V") == Sz("w"));
 }
 
+TEST(FileRegistry, ABatchWritesTheFileOnceAndATakenBackChangeLeavesNoTrace) {
+  TempDir dir;
+  const fs::path file = dir.path() / "registry.reg";
+  FileRegistry registry(file);
+  registry.WriteOnce([&] {
+    EXPECT_EQ(registry.CreateKey(RootKey::CurrentUser, "Software\\Bulk"), KeyDisposition::Created);
+    for (int i = 0; i < 100; ++i) {
+      std::string name = "V";
+      name += std::to_string(i);
+      EXPECT_TRUE(registry.SetValue(RootKey::CurrentUser, "Software\\Bulk", name, Dword(i)));
+    }
+    EXPECT_FALSE(registry.SetValue(RootKey::CurrentUser, "Software\\Missing", "x", Sz("y")));
+    EXPECT_FALSE(fs::exists(file)) << "nothing is written before the batch ends";
+  });
+  FileRegistry reread(file);
+  EXPECT_TRUE(*reread.QueryValue(RootKey::CurrentUser, "Software\\Bulk", "V99") == Dword(99));
+
+  // A batch that cannot be written is taken back whole.
+  FileRegistry unwritable(dir.path() / "no such folder" / "registry.reg");
+  EXPECT_THROW(unwritable.WriteOnce([&] {
+    unwritable.CreateKey(RootKey::CurrentUser, "Software\\Bulk");
+    unwritable.SetValue(RootKey::CurrentUser, "Software\\Bulk", "V", Sz("1"));
+  }),
+               std::runtime_error);
+  EXPECT_FALSE(unwritable.QueryValue(RootKey::CurrentUser, "Software\\Bulk", "V"));
+  EXPECT_EQ(unwritable.CreateKey(RootKey::CurrentUser, "Software\\Bulk"), KeyDisposition::Failed);
+
+  // A single change that cannot be written gives back the value it replaced.
+  registry.data()["HKEY_CURRENT_USER\\Two\nLines"] = {};  // REGEDIT4 cannot write this key
+  EXPECT_FALSE(registry.SetValue(RootKey::CurrentUser, "Software\\Bulk", "V1", Sz("new")));
+  EXPECT_TRUE(*registry.QueryValue(RootKey::CurrentUser, "Software\\Bulk", "V1") == Dword(1));
+  EXPECT_FALSE(registry.SetValue(RootKey::CurrentUser, "Software\\Bulk", "Fresh", Sz("new")));
+  EXPECT_FALSE(registry.QueryValue(RootKey::CurrentUser, "Software\\Bulk", "Fresh"));
+}
+
 // ------------------------------------------------------------------- files
 
 TEST(SandboxFileSystem, MapsWindowsPathsIntoTheSandbox) {
@@ -347,6 +382,35 @@ TEST(SandboxFileSystem, FailsWhereWindowsFails) {
   EXPECT_TRUE(fs::is_directory(sb / "C" / "folder"));
   EXPECT_TRUE(files.DeleteFile("C:\\new.txt"));
   EXPECT_FALSE(files.DeleteFile("C:\\new.txt"));
+}
+
+TEST(SandboxFileSystem, NamesMadeAfterAFolderIsReadAreFoundInAnyCase) {
+  TempDir dir;
+  const fs::path& sb = dir.path();
+  fs::create_directories(sb / "C" / "dir");
+  WriteFile(sb / "C" / "dir" / "b.txt", "");
+  WriteFile(sb / "C" / "dir" / "B.txt", "");
+  SandboxFileSystem files(sb);
+  // Two spellings on the disk: the first by byte order wins.
+  EXPECT_EQ(files.HostPath("C:\\DIR\\b.TXT"), sb / "C" / "dir" / "B.txt");
+  // A name handed out for a file not there yet, then made, is found by
+  // another spelling though the folder was read before it was made.
+  const fs::path made = files.HostPath("C:\\dir\\Report.TXT");
+  EXPECT_EQ(made, sb / "C" / "dir" / "Report.TXT");
+  WriteFile(made, "r");
+  EXPECT_EQ(files.HostPath("c:\\Dir\\REPORT.txt"), made);
+  ASSERT_TRUE(files.AppendText("C:\\DIR\\report.TXT", "s"));
+  EXPECT_EQ(ReadFile(made), "rs");
+  // Once deleted, a name is no longer handed out for another spelling.
+  EXPECT_TRUE(files.DeleteFile("C:\\dir\\report.txt"));
+  EXPECT_EQ(files.HostPath("C:\\dir\\REPORT.txt"), sb / "C" / "dir" / "REPORT.txt");
+  // A name looked up but never made is no answer for another spelling.
+  EXPECT_FALSE(files.Exists("C:\\dir\\Ghost.txt"));
+  EXPECT_EQ(files.HostPath("C:\\dir\\GHOST.txt"), sb / "C" / "dir" / "GHOST.txt");
+  // A folder made later, under a name handed out, is read when first needed.
+  fs::create_directories(files.HostPath("C:\\dir\\Later"));
+  WriteFile(sb / "C" / "dir" / "Later" / "x.TXT", "");
+  EXPECT_EQ(files.HostPath("c:\\DIR\\later\\X.txt"), sb / "C" / "dir" / "Later" / "x.TXT");
 }
 
 // ------------------------------------------------------------------- clock

@@ -3,6 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <fstream>
+
+#include "sim/windows_path.h"
 #include "test_sim_support.h"
 
 namespace kpx::sim::test {
@@ -25,6 +28,45 @@ TEST(SimInputLines, DuplicateKeysAreFaultsAtTheSecondKey) {
   std::string message;
   EXPECT_EQ(3, FaultLine([] { JsonSource("m.json", "{\n \"files\": {},\n \"files\": {}\n}"); }, &message));
   EXPECT_THAT(message, HasSubstr("duplicate key \"files\""));
+}
+
+TEST(SimInputLines, HostileStructureIsAnsweredAtItsLine) {
+  std::string message;
+  // Nesting beyond the limit is refused where it passes the limit, however
+  // deep it goes; up to the limit it is read.
+  const std::string deep = "{\"a\":\n\n" + std::string(20000, '[') + std::string(20000, ']') + "}";
+  EXPECT_EQ(3, FaultLine([&] { JsonSource("m.json", deep); }, &message));
+  EXPECT_THAT(message, HasSubstr("deeper than 512"));
+  const size_t lists = JsonSource::kMaxDepth - 1;  // the top object is one level
+  EXPECT_EQ(-1, FaultLine([&] { JsonSource("m.json", "{\"a\":" + std::string(lists, '[') + std::string(lists, ']') + "}"); }));
+  EXPECT_EQ(1, FaultLine([&] { JsonSource("m.json", "{\"a\":" + std::string(lists + 1, '[') + std::string(lists + 1, ']') + "}"); }));
+  // Brackets inside strings do not nest.
+  EXPECT_EQ(-1, FaultLine([&] { JsonSource("m.json", "{\"a\": \"" + std::string(1000, '[') + "\"}"); }));
+
+  EXPECT_EQ(3, FaultLine([] { JsonSource("m.json", "{\"a\": 1,\n\"b\": [1,\n -1e400]}"); }, &message));
+  EXPECT_EQ("the number -1e400 is out of range", message);
+
+  // A duplicate among many keys, where keys are no longer searched one by one.
+  std::string many = "{";
+  for (int i = 0; i < 1000; ++i) many += "\"k" + std::to_string(i) + "\": " + std::to_string(i) + ",\n";
+  EXPECT_EQ(1001, FaultLine([&] { JsonSource("m.json", many + "\"k500\": 0}"); }, &message));
+  EXPECT_EQ("duplicate key \"k500\"", message);
+  const JsonSource large("m.json", many + "\"last\": [true,\n false]}");
+  EXPECT_EQ(1001, large.LineOf("/last"));
+  EXPECT_EQ(1000, large.LineOfValue(large.root()["k999"]));
+  EXPECT_EQ(1001, large.KeyLineOfValue(large.root(), "last"));
+  EXPECT_EQ((std::vector<int>{1001, 1002}), large.ElementLines(large.root()["last"]));
+}
+
+TEST(SimInputLines, FilesThatCannotBeReadAreNamed) {
+  TempDir dir;
+  std::string message;
+  EXPECT_EQ(0, FaultLine([&] { JsonSource::Load(dir.path()); }, &message));
+  EXPECT_EQ("a folder, not a file", message);
+  EXPECT_EQ(0, FaultLine([&] { JsonSource::Load(dir.path() / "absent.json"); }, &message));
+  EXPECT_EQ("no such file", message);
+  std::ofstream(dir.path() / "empty.json") << "";
+  EXPECT_EQ(1, FaultLine([&] { JsonSource::Load(dir.path() / "empty.json"); }));
 }
 
 TEST(SimInputLines, IndexFollowsEscapedKeysAndNestedLists) {
@@ -84,12 +126,69 @@ TEST(SimModelFaults, EachFaultNamesTheLineOfTheOffendingValue) {
       {"{\"companions\": [{\"progid\": \"P\", \"members\": {\n \"Go\": {\"returns\": {\"object\": \"sub\"}}\n}}]}", 2,
        "no object \"sub\""},
       {"{\"addins\": [{\"name\": \"A\", \"menuStates\": {\n \"CClass_X\": {\"i2\": 70000}\n}}]}", 2, "16-bit"},
+      // Values a Single or a Date cannot hold.
+      {"{\"addins\": [{\"name\": \"A\", \"menuStates\": {\"X\": {\"r4\": 3.4e38},\n \"Y\": {\"r4\": 3.5e38}}}]}", 2,
+       "Single range"},
+      {"{\"addins\": [{\"name\": \"A\", \"menuStates\": {\"X\": {\"date\": -657434},\n \"Y\": {\"date\": 2958466}}}]}",
+       2, "a date lies"},
+      {"{\"clock\": {\n \"time\": \"23:59:59.99999999999999999\"}}", 2, "before 24:00:00"},
+      {"{\"clock\": {\"step\": 86400,\n \"date\": \"2026-01-01\"},\n \"model\": {\"x\": 1}}", 3, "unknown key"},
+      {"{\"resources\": {\"-5\": \"minus is fine\",\n \" 5030\": \"text\"\n}}", 2, "string id"},
+      {"{\"resources\": {\n \"99999999999\": \"text\"\n}}", 2, "string id"},
+      // The k-th add-in of a name is name#k: a name of that form collides.
+      {"{\"addins\": [{\"name\": \"A#2\"}, {\"name\": \"A\"},\n {\"name\": \"A\"}]}", 2, "two add-ins"},
+      // Registry keys and names as Windows and REGEDIT4 take them.
+      {"{\"registry\": {\"HKLM\\\\a\": {},\n \"HKLM\\\\a\\\\\\\\b\": {}}}", 2, "empty part"},
+      {"{\"registry\": {\n \"HKCU\\\\a\\\\\": {}}}", 2, "empty part"},
+      {"{\"registry\": {\n \"HKCU\\\\a\\u0001\": {}}}", 2, "control character"},
+      {"{\"registry\": {\"HKCU\\\\a\": {\n \"x\\u0000y\": 1}}}", 2, "a NUL"},
+      {"{\"registry\": {\"HKCU\\\\a\": {\"x\": \"4294967295\",\n \"y\": {\"dword\": \"99999999999999999999999\"}}}}", 2,
+       "does not fit"},
+      // Paths that Windows cannot make, or that are a file and a folder.
+      {"{\"folders\": [\"C:\\\\ok\",\n \"C:\\\\\"]}", 2, "naming a drive"},
+      {"{\"files\": {\n \"C:\\\\a?b\": \"\"}}", 2, "< > \" | ? *"},
+      {"{\"files\": {\n \"C:\\\\a:b\": \"\"}}", 2, "colon"},
+      {"{\"files\": {\n \"C:\\\\dir\\\\con.txt\": \"\"}}", 2, "device name"},
+      {"{\"files\": {\n \"C:\\\\a.\\\\b\": \"\"}}", 2, "ending in a dot"},
+      {"{\"files\": {\n \"C:\\\\dir\\\\\": \"\"}}", 2, "ending in a backslash"},
+      {"{\"files\": {\n \"C:\\\\a\\u000ab\": \"\"}}", 2, "control character"},
+      {"{\"files\": {\"C:\\\\a\": \"\",\n \"c:\\\\A\\\\b.txt\": \"\"}}", 2, "\"C:\\a\" is a file"},
+      {"{\"folders\": [\"C:\\\\x\\\\y\"],\n \"files\": {\"c:\\\\X\": \"\"}}", 2, "is a folder"},
   };
   for (const Case& c : cases) {
     std::string message;
     EXPECT_EQ(c.line, FaultLine([&] { ParseModel(c.text); }, &message)) << c.text;
     EXPECT_THAT(message, HasSubstr(c.says)) << c.text;
   }
+}
+
+TEST(SimModelFaults, PathsLongerThanWindowsAllowsAreRefused) {
+  std::string message;
+  const std::string name(200, 'n');
+  EXPECT_EQ(-1, FaultLine([&] { ParseModel("{\"folders\": [\"C:\\\\" + name + "\"]}"); }));
+  EXPECT_EQ(2, FaultLine([&] { ParseModel("{\"folders\": [\n\"C:\\\\" + name + "\\\\" + name + "\"]}"); }, &message));
+  EXPECT_THAT(message, HasSubstr("longer than 259"));
+  EXPECT_EQ(2, FaultLine([&] { ParseModel("{\"folders\": [\n\"" + std::string(256, 'n') + "\"]}"); }, &message));
+  EXPECT_THAT(message, HasSubstr("longer than 255"));
+}
+
+TEST(SimPaths, SpellingsOfOnePlaceFoldTogether) {
+  using Parts = std::vector<std::string>;
+  EXPECT_EQ((Parts{"c", "dir", "f.txt"}), FoldedPathParts(R"(C:\Dir\.\\F.TXT)"));
+  EXPECT_EQ((Parts{"c", "dir", "f.txt"}), FoldedPathParts("dir/f.txt"));
+  EXPECT_EQ((Parts{"d", "etc"}), FoldedPathParts(R"(d:\a\..\..\..\Etc\)"));
+  EXPECT_EQ((Parts{"unc", "srv", "share", "x"}), FoldedPathParts(R"(\\SRV\Share\..\..\x)"));
+
+  PathPlan plan;
+  EXPECT_EQ("", plan.MakeFolder(R"(C:\Logs\Old)"));
+  EXPECT_EQ("", plan.WriteFile(R"(c:\logs\a.txt)"));
+  EXPECT_THAT(plan.WriteFile(R"(C:\LOGS\a.txt\b)"), HasSubstr("is a file"));
+  EXPECT_THAT(plan.WriteFile(R"(C:\logs\old)"), HasSubstr("is a folder"));
+  EXPECT_THAT(plan.RemoveFile(R"(C:\Logs)"), HasSubstr("only files are deleted"));
+  // A file deleted may become a folder; deleting what is not there is no fault.
+  EXPECT_EQ("", plan.RemoveFile(R"(C:\Logs\A.TXT)"));
+  EXPECT_EQ("", plan.WriteFile(R"(C:\Logs\a.txt\b)"));
+  EXPECT_EQ("", plan.RemoveFile(R"(C:\nothing\here)"));
 }
 
 TEST(SimModelRegistry, ValueFormsBecomeTheRegistryTypesTheyName) {
@@ -216,6 +315,35 @@ TEST(SimScenarioFaults, TheAddInObjectsLifeIsChecked) {
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"selec\": [\"CFoo\"]}]}", &message));
   EXPECT_THAT(message, HasSubstr("unknown action"));
   EXPECT_EQ(2, ScenarioFault("{\"actions\": [\n {\"select\": [\"CFoo\"], \"args\": []}]}", &message));
+}
+
+TEST(SimScenarioFaults, FilesAreCheckedAgainstWhatTheModelAndEarlierStepsMade) {
+  const ModelDef model = ParseModel(R"({"folders": ["C:\\Logs"], "files": {"C:\\a.txt": ""}})");
+  auto fault = [&](const std::string& text, std::string* message) {
+    return FaultLine([&] { LoadScenario(JsonSource("s.json", text), model); }, message);
+  };
+  std::string message;
+  EXPECT_EQ(2, fault("{\"actions\": [\n {\"setFile\": {\"C:\\\\logs\": null}}]}", &message));
+  EXPECT_THAT(message, HasSubstr("only files are deleted"));
+  EXPECT_EQ(2, fault("{\"actions\": [\n {\"setFile\": {\"C:\\\\A.txt\\\\b\": \"x\"}}]}", &message));
+  EXPECT_THAT(message, HasSubstr("is a file"));
+  EXPECT_EQ(3, fault("{\"actions\": [{\"setFile\": {\"C:\\\\new\\\\f\": \"x\"}},\n {\"setFile\": {\"C:\\\\x\": \"\"}},\n"
+                     " {\"setFile\": {\"C:\\\\NEW\": \"x\"}}]}",
+                     &message));
+  EXPECT_THAT(message, HasSubstr("is a folder"));
+  // Once deleted, a file's place may hold a folder.
+  EXPECT_EQ(-1, fault(R"({"actions": [{"setFile": {"C:\\a.txt": null}}, {"setFile": {"C:\\a.txt\\b": "x"}}]})", nullptr));
+}
+
+TEST(SimScenario, StepsKnowTheirLines) {
+  const ModelDef model = ParseModel(kModel);
+  const Scenario s =
+      LoadScenario(JsonSource("s.json", "{\"actions\": [\n {\"call\": \"Name\"},\n\n {\"select\": [\n]}, {\"release\": true}]}"),
+                   model);
+  ASSERT_EQ(3u, s.actions.size());
+  EXPECT_EQ(2, s.actions[0].line);
+  EXPECT_EQ(4, s.actions[1].line);
+  EXPECT_EQ(5, s.actions[2].line);
 }
 
 TEST(SimScenario, TheFirstActionDecidesWhetherTheRunCreatesTheObject) {

@@ -4,6 +4,11 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <climits>
+#include <cstdint>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
 
 #include "sim/transcript.h"
 #include "sim/values.h"
@@ -140,6 +145,69 @@ TEST(SimRun, WorldActionsChangeRegistryFilesAndSelectionBetweenCalls) {
   EXPECT_EQ(4u, w.Events("world").size());
 }
 
+TEST(SimRun, WorldStepsThatFailAreLoggedWithTheirLineAndTheRunGoesOn) {
+  SimWorld w(kWorld);
+  // Made outside the scenario, as the add-in makes its files: a file where
+  // a step needs a folder, and a folder where a step deletes a file.
+  std::ofstream(w.files().HostPath("C:\\Logs\\made.log")) << "x";
+  std::filesystem::create_directories(w.files().HostPath("C:\\Logs\\Sub"));
+  w.Run("{\"actions\": [\n"
+        " {\"setFile\": {\"C:\\\\Logs\\\\made.log\\\\inside.txt\": \"x\", \"C:\\\\Logs\\\\ok.txt\": \"y\"}},\n"
+        " {\"setFile\": {\"C:\\\\LOGS\\\\sub\": null}},\n"
+        " {\"select\": [\"CFoo\"]}\n"
+        "]}");
+  const std::vector<EventJson> failed = w.Events("world-failed");
+  ASSERT_EQ(2u, failed.size());
+  EXPECT_EQ(2, failed[0]["line"]);
+  EXPECT_EQ("setFile", failed[0]["action"]);
+  EXPECT_THAT(failed[0]["reason"].get<std::string>(), HasSubstr("a file lies where a folder must be"));
+  EXPECT_EQ(3, failed[1]["line"]);
+  EXPECT_THAT(failed[1]["reason"].get<std::string>(), HasSubstr("it is a folder"));
+  // The other file of the step was written, the folder kept, and the run went on.
+  EXPECT_TRUE(w.files().Exists("C:\\Logs\\ok.txt"));
+  EXPECT_TRUE(w.files().Exists("C:\\Logs\\Sub"));
+  EXPECT_EQ(3u, w.Events("world").size());
+  EXPECT_EQ(1u, w.world().SelectedItems().size());
+}
+
+// Takes the events as they happen; can be made to break after some.
+class TestSink final : public EventSink {
+ public:
+  explicit TestSink(size_t breakAfter = SIZE_MAX) : breakAfter_(breakAfter) {}
+  void Write(const EventJson& event) override { kinds.push_back(event.value("ev", "")); }
+  void Flush() override { flushedAt.push_back(kinds.size()); }
+  bool broken() const override { return kinds.size() >= breakAfter_; }
+  std::vector<std::string> kinds;
+  std::vector<size_t> flushedAt;
+
+ private:
+  size_t breakAfter_;
+};
+
+TEST(SimRun, AStreamedLogKeepsNothingFlushesEachStepAndStopsWhenItsSinkBreaks) {
+  const char* scenario = R"({"actions": [{"call": "Name"}, {"select": []}, {"call": "Name"}, {"call": "Name"}]})";
+  TestSink sink;  // outlives the world, which may log as it goes
+  SimWorld streamed(kWorld);
+  streamed.log().StreamTo(&sink);
+  streamed.Run(scenario);
+  EXPECT_TRUE(streamed.log().events().empty());
+  EXPECT_EQ(3, std::count(sink.kinds.begin(), sink.kinds.end(), "call"));
+  EXPECT_EQ(1, std::count(sink.kinds.begin(), sink.kinds.end(), "release"));
+  // After the creation and after each of the four steps.
+  EXPECT_EQ(5u, sink.flushedAt.size());
+  EXPECT_TRUE(std::is_sorted(sink.flushedAt.begin(), sink.flushedAt.end()));
+
+  SimWorld kept(kWorld);
+  kept.Run(scenario);
+  EXPECT_EQ(sink.kinds.size(), kept.log().events().size());
+
+  TestSink breaking(4);
+  SimWorld broken(kWorld);
+  broken.log().StreamTo(&breaking);
+  EXPECT_THROW(broken.Run(scenario), std::runtime_error);
+  EXPECT_LT(std::count(breaking.kinds.begin(), breaking.kinds.end(), "call"), 3);
+}
+
 TEST(SimPlatform, AppendsToTheDebugLogAreToldApartWhateverTheCase) {
   SimWorld w(kWorld);
   platform::FileSystem& files = w.sim().platform().files;
@@ -203,6 +271,63 @@ TEST(SimClock, TimerStepsAfterEachReadAndRollsOverAtMidnight) {
   EXPECT_EQ(1, after.day);
   clock.Sleep(1500);
   EXPECT_FLOAT_EQ(1.75f, clock.Timer());
+}
+
+TEST(SimClock, LongStepsMoveWholeDaysAndTheClockStopsAtTheLastDayADateHolds) {
+  VirtualClock clock;
+  ClockSetting s;
+  s.date = platform::DateTime{2026, 2, 27};
+  s.seconds = 43200;
+  s.step = 86400;
+  clock.Set(s);
+  clock.Timer();
+  clock.Timer();
+  EXPECT_EQ(3, clock.Now().month);
+  EXPECT_EQ(1, clock.Now().day);
+  EXPECT_EQ(12, clock.Now().hour);
+  clock.Sleep(4294967295u);  // 49 days, 17:02:47.295
+  EXPECT_EQ(4, clock.Now().month);
+  EXPECT_EQ(20, clock.Now().day);
+  EXPECT_EQ(5, clock.Now().hour);
+  EXPECT_NEAR(5 * 3600 + 2 * 60 + 47.295, clock.seconds(), 1e-6);
+
+  s.date = platform::DateTime{9999, 12, 30};
+  clock.Set(s);
+  for (int i = 0; i < 5; ++i) clock.Timer();
+  const platform::DateTime last = clock.Now();
+  EXPECT_EQ(9999, last.year);
+  EXPECT_EQ(31, last.day);
+  EXPECT_EQ(23, last.hour);
+  EXPECT_EQ(59, last.second);
+}
+
+TEST(SimTranscript, WrittenAsTheEventsComeItEqualsTheWholeAndKeepsEveryDebugLine) {
+  std::vector<EventJson> events = {{{"ev", "call"}, {"member", "OnActivate"}, {"args", EventJson::array()}},
+                                   {{"ev", "addin"}, {"addin", "VC++"}, {"action", "Activate"}}};
+  for (int i = 0; i < 3000; ++i) events.push_back({{"ev", "debuglog"}, {"line", "line " + std::to_string(i)}, {"ok", true}});
+  events.push_back({{"ev", "world-failed"}, {"action", "setFile"}, {"line", 7}, {"reason", "no room"}});
+  events.push_back({{"ev", "aborted"}, {"reason", "disk full"}});
+  std::ostringstream streamed;
+  TranscriptWriter writer(streamed, "title");
+  for (const EventJson& e : events) writer.Write(e);
+  writer.Finish();
+  const std::string whole = Transcript(events, "title");
+  EXPECT_EQ(whole, streamed.str());
+  EXPECT_THAT(whole, HasSubstr("add-ins          VC++.Activate\n"));
+  EXPECT_THAT(whole, HasSubstr("3000 lines written\n    line 0\n    line 1\n"));
+  EXPECT_THAT(whole, HasSubstr("    line 2999\n"));
+  EXPECT_THAT(whole, HasSubstr("setFile of line 7 FAILED: no room"));
+  EXPECT_THAT(whole, HasSubstr("ABORTED   the run stopped here: disk full"));
+
+  SpillList texts;
+  for (int i = 0; i < 100; ++i) texts.Add(std::string(static_cast<size_t>(i), static_cast<char>('a' + i % 26)));
+  std::vector<std::string> back;
+  texts.ForEach([&](const std::string& t) { back.push_back(t); });
+  texts.ForEach([&](const std::string& t) { back.push_back(t); });  // again: nothing is used up
+  ASSERT_EQ(200u, back.size());
+  EXPECT_EQ("", back[0]);
+  EXPECT_EQ(std::string(99, 'a' + 99 % 26), back[99]);
+  EXPECT_EQ(back[42], back[142]);
 }
 
 TEST(SimTranscript, LinesReadAsTheEventsMean) {

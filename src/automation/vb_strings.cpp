@@ -57,18 +57,29 @@ std::string Right(std::string_view s, size_t length) {
   return length >= s.size() ? std::string(s) : std::string(s.substr(s.size() - length));
 }
 
+namespace {
+
+// ASCII letters folded in place: what std::tolower does in the "C" locale,
+// without a library call per character (keyed maps compare long keys
+// often).
+inline int FoldAscii(char c) {
+  const auto u = static_cast<unsigned char>(c);
+  return u >= 'A' && u <= 'Z' ? u + ('a' - 'A') : u;
+}
+
+}  // namespace
+
 bool EqualsNoCase(std::string_view a, std::string_view b) {
   if (a.size() != b.size()) return false;
   for (size_t i = 0; i < a.size(); ++i)
-    if (std::tolower(static_cast<unsigned char>(a[i])) != std::tolower(static_cast<unsigned char>(b[i])))
-      return false;
+    if (FoldAscii(a[i]) != FoldAscii(b[i])) return false;
   return true;
 }
 
 bool NoCaseLess::operator()(std::string_view a, std::string_view b) const {
   const size_t n = a.size() < b.size() ? a.size() : b.size();
   for (size_t i = 0; i < n; ++i) {
-    int x = std::tolower(static_cast<unsigned char>(a[i])), y = std::tolower(static_cast<unsigned char>(b[i]));
+    const int x = FoldAscii(a[i]), y = FoldAscii(b[i]);
     if (x != y) return x < y;
   }
   return a.size() < b.size();

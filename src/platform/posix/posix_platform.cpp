@@ -102,18 +102,51 @@ std::optional<platform::RegistryValue> FileRegistry::QueryValue(platform::RootKe
   return v->second;
 }
 
+void FileRegistry::WriteOnce(const std::function<void()>& changes) {
+  if (holding_ || file_.empty()) {
+    changes();
+    return;
+  }
+  const RegeditData before = data_;
+  holding_ = true;
+  auto write = [&] {
+    holding_ = false;
+    try {
+      Save();
+    } catch (const std::exception&) {
+      data_ = before;
+      throw;
+    }
+  };
+  try {
+    changes();
+  } catch (...) {
+    write();  // what was changed before the fault stays, written
+    throw;
+  }
+  write();
+}
+
 // The registry call either takes effect or does not: a change that cannot
 // reach the file is taken back, so memory and file never disagree.
 bool FileRegistry::SetValue(platform::RootKey root, std::string_view key, std::string_view name,
                             const platform::RegistryValue& value) {
   std::optional<std::string> full = FullKey(root, key);
   if (!full || !KeyExists(*full)) return false;
-  const RegeditData before = data_;
-  data_[*full][std::string(name)] = value;
+  RegeditValues& values = data_[*full];
+  const std::string valueName(name);
+  auto old = values.find(valueName);
+  std::optional<platform::RegistryValue> previous;
+  if (old != values.end()) previous = old->second;
+  values[valueName] = value;
+  if (holding_) return true;
   try {
     Save();
   } catch (const std::exception&) {
-    data_ = before;
+    if (previous)
+      values[valueName] = *previous;
+    else
+      values.erase(valueName);
     return false;
   }
   return true;
@@ -124,6 +157,7 @@ platform::KeyDisposition FileRegistry::CreateKey(platform::RootKey root, std::st
   if (!full) return platform::KeyDisposition::Failed;
   if (KeyExists(*full)) return platform::KeyDisposition::Opened;
   data_.emplace(*full, RegeditValues{});
+  if (holding_) return platform::KeyDisposition::Created;
   try {
     Save();
   } catch (const std::exception&) {
@@ -172,18 +206,10 @@ std::vector<std::string> WindowsComponents(std::string_view path) {
   return parts;
 }
 
-// The entry of `dir` that matches `name`: the exact spelling when present,
-// otherwise the first (by byte order) that differs only in case.
-fs::path ResolveComponent(const fs::path& dir, const std::string& name) {
-  std::error_code ec;
-  fs::path exact = dir / name;
-  if (fs::exists(fs::symlink_status(exact, ec))) return exact;
-  std::optional<std::string> best;
-  for (fs::directory_iterator it(dir, ec), end; !ec && it != end; it.increment(ec)) {
-    std::string entry = it->path().filename().string();
-    if (EqualNoCase(entry, name) && (!best || entry < *best)) best = entry;
-  }
-  return best ? dir / *best : exact;
+std::string Folded(std::string_view name) {
+  std::string out(name);
+  std::transform(out.begin(), out.end(), out.begin(), Lower);
+  return out;
 }
 
 bool EndsWithSeparator(std::string_view path) { return !path.empty() && IsSeparator(path.back()); }
@@ -196,13 +222,39 @@ std::string_view Win32Path(std::string_view path) { return path.substr(0, path.f
 
 }  // namespace
 
+// The entry of `folder` that matches `name`: the exact spelling when
+// present, otherwise the first (by byte order) that differs only in case.
+fs::path SandboxFileSystem::Resolve(const fs::path& folder, const std::string& name) const {
+  std::error_code ec;
+  fs::path exact = folder / name;
+  if (fs::exists(fs::symlink_status(exact, ec))) return exact;
+  auto [listing, first] = listings_.try_emplace(folder.string());
+  Spellings& byFolded = listing->second;
+  if (first)
+    for (fs::directory_iterator it(folder, ec), end; !ec && it != end; it.increment(ec)) {
+      std::string entry = it->path().filename().string();
+      byFolded[Folded(entry)].push_back(std::move(entry));
+    }
+  std::vector<std::string>& spellings = byFolded[Folded(name)];
+  // Names never made, or deleted since, are dropped as they are met.
+  std::erase_if(spellings, [&](const std::string& s) {
+    return s != name && !fs::exists(fs::symlink_status(folder / s, ec));
+  });
+  const std::string* best = nullptr;
+  for (const std::string& s : spellings)
+    if (s != name && (!best || s < *best)) best = &s;
+  if (best) return folder / *best;
+  if (std::find(spellings.begin(), spellings.end(), name) == spellings.end()) spellings.push_back(name);
+  return exact;
+}
+
 fs::path SandboxFileSystem::HostPath(std::string_view windowsPath) const {
   windowsPath = Win32Path(windowsPath);
   fs::path host = sandbox_;
   bool resolving = true;  // once a component is missing, nothing below it exists either
   for (const std::string& part : WindowsComponents(windowsPath)) {
     if (resolving) {
-      host = ResolveComponent(host, part);
+      host = Resolve(host, part);
       std::error_code ec;
       resolving = fs::is_directory(host, ec);
     } else {

@@ -3,10 +3,13 @@
 #pragma once
 
 #include <filesystem>
+#include <functional>
 #include <map>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <unordered_map>
+#include <vector>
 
 #include "platform/platform.h"
 #include "platform/posix/regedit_file.h"
@@ -14,8 +17,9 @@
 namespace kpx::posix {
 
 // A registry backed by a REGEDIT4 file that a user can read and edit. The
-// file is read when the object is made and written back after every change.
-// With an empty path the registry lives in memory only.
+// file is read when the object is made and written back after every change,
+// or once after a batch of changes (WriteOnce). With an empty path the
+// registry lives in memory only.
 class FileRegistry final : public platform::Registry {
  public:
   explicit FileRegistry(std::filesystem::path file = {});
@@ -33,6 +37,12 @@ class FileRegistry final : public platform::Registry {
   // Writes the file (nothing to do without one); raises std::runtime_error
   // when it cannot be written, leaving the previous file as it was.
   void Save();
+  // Makes `changes` and writes the file once, after them, rather than after
+  // each: seeding thousands of values would otherwise write the whole file
+  // thousands of times. When the file cannot be written the changes are
+  // taken back, so memory and file still agree, and std::runtime_error is
+  // raised.
+  void WriteOnce(const std::function<void()>& changes);
 
  private:
   // "HKEY_...\key"; nothing for a root this registry does not hold.
@@ -41,6 +51,7 @@ class FileRegistry final : public platform::Registry {
 
   std::filesystem::path file_;
   RegeditData data_;
+  bool holding_ = false;  // inside WriteOnce
 };
 
 // Windows paths ("C:\dir\f.txt") map to <sandbox>/C/dir/f.txt; a path
@@ -58,7 +69,17 @@ class SandboxFileSystem final : public platform::FileSystem {
   const std::filesystem::path& sandbox() const { return sandbox_; }
 
  private:
+  std::filesystem::path Resolve(const std::filesystem::path& folder, const std::string& name) const;
+
   std::filesystem::path sandbox_;
+  // A folder's names by their lower-case form: a name that is not there as
+  // written is looked up here rather than by listing the folder each time.
+  // Each folder is listed once, when first needed; every name handed out
+  // for a place that does not exist yet is added, since it may be made
+  // next. The sandbox changes only through such names, so a listing stays
+  // complete; names since deleted are checked for on the disk.
+  using Spellings = std::unordered_map<std::string, std::vector<std::string>>;
+  mutable std::unordered_map<std::string, Spellings> listings_;
 };
 
 // The machine's clock in local time.
