@@ -212,14 +212,25 @@ bool RecordingFileSystem::DeleteFile(std::string_view path) {
   return ok;
 }
 
-bool RecordingFileSystem::AppendText(std::string_view path, std::string_view text) {
-  const bool ok = inner_.AppendText(path, text);
+bool RecordingFileSystem::AppendComposed(std::string_view path, const std::function<std::string()>& compose) {
+  std::optional<std::string> text;  // stays empty when the file never opened
+  const bool ok = inner_.AppendComposed(path, [&] {
+    text = compose();
+    return *text;
+  });
   if (EqualsNoCase(path, debugLog_.Path())) {
-    std::string_view line = text;
-    if (line.size() >= 2 && line.substr(line.size() - 2) == "\r\n") line.remove_suffix(2);
-    log_.Add({{"ev", "debuglog"}, {"line", line}, {"ok", ok}});
+    EventJson ev{{"ev", "debuglog"}};
+    if (text) {
+      std::string_view line = *text;
+      if (line.size() >= 2 && line.substr(line.size() - 2) == "\r\n") line.remove_suffix(2);
+      ev["line"] = line;
+    }
+    ev["ok"] = ok;
+    log_.Add(std::move(ev));
   } else {
-    log_.Add({{"ev", "file-append"}, {"path", path}, {"text", text}, {"ok", ok}});
+    // Other files are written with a text known beforehand; making it
+    // again for the record costs nothing the add-in can see.
+    log_.Add({{"ev", "file-append"}, {"path", path}, {"text", text ? *text : compose()}, {"ok", ok}});
   }
   return ok;
 }

@@ -134,7 +134,7 @@ class RecordingFileSystem final : public platform::FileSystem {
       : inner_(inner), log_(log), debugLog_(debugLog) {}
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
-  bool AppendText(std::string_view path, std::string_view text) override;
+  bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
 
  private:
   platform::FileSystem& inner_;

@@ -107,16 +107,21 @@ class MemoryFiles : public platform::FileSystem {
     if (journal) journal->push_back("delete " + std::string(path));
     return files.erase(LCase(path)) != 0;
   }
-  bool AppendText(std::string_view path, std::string_view text) override {
+  bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override {
     ++appendAttempts;
     if (failing.count(LCase(path))) return false;
-    files[LCase(path)] += text;
+    if (failNext > 0) {
+      --failNext;
+      return false;
+    }
+    files[LCase(path)] += compose();
     return true;
   }
   std::string& at(std::string_view path) { return files[LCase(path)]; }
 
   std::map<std::string, std::string> files;  // by lower-case path
   std::set<std::string> failing;             // lower-case paths
+  int failNext = 0;                          // appends to refuse, whatever the path
   int appendAttempts = 0;
   Journal* journal = nullptr;
 };

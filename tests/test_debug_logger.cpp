@@ -65,10 +65,21 @@ TEST_F(DebugLoggerTest, SuppressedStampsAnyCaseStartTheLineWithOneBlank) {
 
 TEST_F(DebugLoggerTest, AFileThatCannotBeWrittenCostsFiveAttemptsAndFiveWaits) {
   Mask(-1);
+  world.clock.step = 0.1f;
   world.files.failing.insert("c:\\tzndebuglog.txt");
   EXPECT_TRUE(logger.DebugLog("lost", logid::ADDIN, loglevel::TRACE));
   EXPECT_EQ(world.files.appendAttempts, 5);
   EXPECT_EQ(world.clock.sleeps, (std::vector<uint32_t>{100, 100, 100, 100, 100}));
+  EXPECT_EQ(world.clock.seconds, 11232.5f) << "an attempt that cannot open the file reads no clock";
+}
+
+TEST_F(DebugLoggerTest, TheStampIsTheTimeOfTheOpenThatSucceeded) {
+  Mask(-1);
+  world.clock.step = 0.1f;
+  world.files.failNext = 2;
+  EXPECT_TRUE(logger.DebugLog("late", logid::ADDIN, loglevel::TRACE));
+  EXPECT_EQ(world.clock.sleeps, (std::vector<uint32_t>{100, 100}));
+  EXPECT_EQ(Log(), "11/15/2026 3:07:12 AM (11232.5)  TRACE    ADDIN     late\r\n");
 }
 
 TEST_F(DebugLoggerTest, PathComesFromOutputFileThenInstallDirThenDefault) {

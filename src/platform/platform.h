@@ -5,6 +5,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -63,9 +64,16 @@ class FileSystem {
   virtual bool Exists(std::string_view path) = 0;
   // Deletes a file; false when it was missing or could not be deleted.
   virtual bool DeleteFile(std::string_view path) = 0;
-  // Opens the file for appending (creating it when missing), writes the
-  // text in the system code page, closes it. False on any failure.
-  virtual bool AppendText(std::string_view path, std::string_view text) = 0;
+  // Opens the file for appending (creating it when missing) and, only once
+  // it is open, asks `compose` for the text, writes it in the system code
+  // page and closes the file. False on any failure. A debug line's stamp is
+  // the time of a successful open, so a file that cannot be opened never
+  // has its text made.
+  virtual bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) = 0;
+  // The same for a text known beforehand.
+  bool AppendText(std::string_view path, std::string_view text) {
+    return AppendComposed(path, [text] { return std::string(text); });
+  }
 };
 
 // ------------------------------------------------------------------- clock

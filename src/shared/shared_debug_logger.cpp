@@ -93,7 +93,9 @@ bool DebugLogger::WriteLine(std::string_view message, int32_t logId, int32_t lev
   }
   const std::string idName = PadRight8(LogIdName(logId));
   const std::string levelName = PadRight8(LogLevelName(level));
-  for (int attempt = 0; attempt < kWriteAttempts; ++attempt) {
+  // The stamp is taken once the file is open: an attempt that cannot open
+  // it never reads the clock.
+  const auto compose = [&] {
     std::string line = TimeStamp();
     line += ' ';
     line += levelName;
@@ -102,7 +104,10 @@ bool DebugLogger::WriteLine(std::string_view message, int32_t logId, int32_t lev
     line += "  ";
     line += message;
     line += "\r\n";
-    if (platform_.files.AppendText(path_, line)) return true;
+    return line;
+  };
+  for (int attempt = 0; attempt < kWriteAttempts; ++attempt) {
+    if (platform_.files.AppendComposed(path_, compose)) return true;
     platform_.clock.Sleep(kRetryWaitMs);
   }
   return true;

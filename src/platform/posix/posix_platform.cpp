@@ -280,7 +280,7 @@ bool SandboxFileSystem::DeleteFile(std::string_view path) {
   return fs::remove(host, ec) && !ec;
 }
 
-bool SandboxFileSystem::AppendText(std::string_view path, std::string_view text) {
+bool SandboxFileSystem::AppendComposed(std::string_view path, const std::function<std::string()>& compose) {
   path = Win32Path(path);
   // "C:\logs\" names a folder, never a file to append to.
   if (path.empty() || EndsWithSeparator(path)) return false;
@@ -291,6 +291,7 @@ bool SandboxFileSystem::AppendText(std::string_view path, std::string_view text)
   if (fs::is_directory(host, ec)) return false;
   std::ofstream out(host, std::ios::binary | std::ios::app);
   if (!out) return false;
+  const std::string text = compose();
   out.write(text.data(), static_cast<std::streamsize>(text.size()));
   out.close();
   return static_cast<bool>(out);

@@ -63,7 +63,7 @@ class SandboxFileSystem final : public platform::FileSystem {
 
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
-  bool AppendText(std::string_view path, std::string_view text) override;
+  bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
 
   std::filesystem::path HostPath(std::string_view windowsPath) const;
   const std::filesystem::path& sandbox() const { return sandbox_; }

@@ -81,12 +81,12 @@ bool Win32FileSystem::Exists(std::string_view path) {
 
 bool Win32FileSystem::DeleteFile(std::string_view path) { return DeleteFileA(Utf8ToAnsi(path).c_str()) != 0; }
 
-bool Win32FileSystem::AppendText(std::string_view path, std::string_view text) {
+bool Win32FileSystem::AppendComposed(std::string_view path, const std::function<std::string()>& compose) {
   // Others (the sibling add-ins, a viewer) may have the log open too.
   HANDLE file = CreateFileA(Utf8ToAnsi(path).c_str(), FILE_APPEND_DATA, FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr,
                             OPEN_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
   if (file == INVALID_HANDLE_VALUE) return false;
-  const std::string ansi = Utf8ToAnsi(text);
+  const std::string ansi = Utf8ToAnsi(compose());
   DWORD written = 0;
   const BOOL ok = WriteFile(file, ansi.data(), static_cast<DWORD>(ansi.size()), &written, nullptr);
   const BOOL closed = CloseHandle(file);

@@ -25,7 +25,7 @@ class Win32FileSystem final : public platform::FileSystem {
  public:
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
-  bool AppendText(std::string_view path, std::string_view text) override;
+  bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
 };
 
 class Win32Clock final : public platform::Clock {
