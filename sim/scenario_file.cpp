@@ -190,8 +190,19 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
         }
       } else if (which == "answer") {
         a.type = Action::Type::Answer;
-        body.ExpectKeys({"button"});
-        a.answer = body.Member("button").Int32();
+        if (auto pressed = body.Find("prompt")) {
+          // The add-in's prompt: which button closes it, whether the box is
+          // ticked and whether Help is pressed first.
+          body.ExpectKeys({"prompt", "dontShow", "help"});
+          const std::string button = pressed->String();
+          if (button != "ok" && button != "cancel") pressed->Fail("the prompt closes with \"ok\" or \"cancel\"");
+          a.prompt = platform::PromptOutcome{button == "cancel", false};
+          if (auto tick = body.Find("dontShow")) a.prompt->dontShow = tick->Bool();
+          if (auto help = body.Find("help")) a.promptHelp = help->Bool();
+        } else {
+          body.ExpectKeys({"button"});
+          a.answer = body.Member("button").Int32();
+        }
       } else if (which == "clock") {
         a.type = Action::Type::Clock;
         a.clock = ParseClock(body);

@@ -37,6 +37,9 @@ struct Action {
 
   std::vector<std::string> select;
   int answer = 0;
+  // An answer for the prompt dialog rather than a message box.
+  std::optional<platform::PromptOutcome> prompt;
+  bool promptHelp = false;  // Help pressed before closing it
   ClockSetting clock;
   std::vector<RegistryEntry> registry;
   std::vector<std::pair<std::string, std::optional<std::string>>> files;  // no content: delete

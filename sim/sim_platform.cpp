@@ -98,6 +98,48 @@ int SimUserInterface::MessageBox(std::string_view text, std::string_view title, 
   return answer;
 }
 
+namespace {
+
+const char* IconName(platform::PromptIcon icon) {
+  switch (icon) {
+    case platform::PromptIcon::Critical:
+      return "critical";
+    case platform::PromptIcon::Question:
+      return "question";
+    case platform::PromptIcon::Information:
+      return "information";
+    case platform::PromptIcon::None:
+      break;
+  }
+  return "none";
+}
+
+}  // namespace
+
+platform::PromptOutcome SimUserInterface::ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) {
+  PromptAnswer answer;  // OK, box not ticked, when the scenario says nothing
+  const bool scripted = !promptAnswers_.empty();
+  if (scripted) {
+    answer = promptAnswers_.front();
+    promptAnswers_.pop_front();
+  }
+  // A disabled Help button does nothing when pressed.
+  const bool helpPressed = answer.help && view.helpAvailable;
+  if (helpPressed) help.ShowHelp(kPromptWindow);
+  log_.Add({{"ev", "prompt"},
+            {"message", view.message},
+            {"title", view.title},
+            {"icon", IconName(view.icon)},
+            {"buttons", EventJson::array({view.okCaption, view.cancelCaption, view.helpCaption})},
+            {"helpEnabled", view.helpAvailable},
+            {"checkBox", view.dontShowCaption},
+            {"helpPressed", helpPressed},
+            {"pressed", answer.outcome.cancelled ? "cancel" : "ok"},
+            {"dontShow", answer.outcome.dontShow},
+            {"answered", scripted ? "scenario" : "default"}});
+  return answer.outcome;
+}
+
 bool SimUserInterface::WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) {
   log_.Add({{"ev", "help"}, {"window", window}, {"file", helpFile}, {"command", command}, {"data", data}});
   return true;

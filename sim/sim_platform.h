@@ -63,6 +63,16 @@ class SimUserInterface final : public platform::UserInterface {
   explicit SimUserInterface(EventLog& log) : log_(log) {}
   void QueueAnswer(int button) { answers_.push_back(button); }
   const std::deque<int>& pendingAnswers() const { return answers_; }
+  struct PromptAnswer {
+    platform::PromptOutcome outcome;
+    bool help = false;  // Help pressed before the closing button
+  };
+  void QueuePromptAnswer(PromptAnswer answer) { promptAnswers_.push_back(answer); }
+  const std::deque<PromptAnswer>& pendingPromptAnswers() const { return promptAnswers_; }
+  // The window number the played prompt has, as Help hands it on.
+  static constexpr int64_t kPromptWindow = 4343;
+
+  platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
 
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
@@ -71,6 +81,7 @@ class SimUserInterface final : public platform::UserInterface {
  private:
   EventLog& log_;
   std::deque<int> answers_;
+  std::deque<PromptAnswer> promptAnswers_;
 };
 
 // ---------------------------------------------------------------- registry

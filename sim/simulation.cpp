@@ -71,6 +71,8 @@ void Simulation::Run(const Scenario& scenario) {
   if (!ui_.pendingAnswers().empty())
     log_.Add({{"ev", "unused-answers"},
               {"buttons", EventJson(std::vector<int>(ui_.pendingAnswers().begin(), ui_.pendingAnswers().end()))}});
+  if (!ui_.pendingPromptAnswers().empty())
+    log_.Add({{"ev", "unused-answers"}, {"prompts", ui_.pendingPromptAnswers().size()}});
 }
 
 void Simulation::Create() {
@@ -128,7 +130,10 @@ void Simulation::Apply(const Action& a) {
       logWorld("select");
       break;
     case Action::Type::Answer:
-      ui_.QueueAnswer(a.answer);
+      if (a.prompt)
+        ui_.QueuePromptAnswer({*a.prompt, a.promptHelp});
+      else
+        ui_.QueueAnswer(a.answer);
       logWorld("answer");
       break;
     case Action::Type::Clock:

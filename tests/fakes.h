@@ -155,6 +155,19 @@ class FakeUi : public platform::UserInterface {
   void DoEvents() override {
     if (journal) journal->push_back("DoEvents");
   }
+  // Prompts are answered from `promptAnswers` in order, OK otherwise; Help
+  // is pressed first when `pressHelp` is set.
+  platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& h) override {
+    prompts.push_back(view);
+    if (pressHelp) h.ShowHelp(77);
+    if (promptAnswers.empty()) return {};
+    platform::PromptOutcome o = promptAnswers.front();
+    promptAnswers.erase(promptAnswers.begin());
+    return o;
+  }
+  std::vector<platform::PromptView> prompts;
+  std::vector<platform::PromptOutcome> promptAnswers;
+  bool pressHelp = false;
   std::vector<std::string> boxes, help;
   Journal* journal = nullptr;
 };

@@ -114,9 +114,42 @@ inline constexpr int kIdOk = 1;
 inline constexpr uint32_t kHelpContext = 1;
 inline constexpr uint32_t kHelpFinder = 11;
 
+// ----------------------------------------------------------- prompt dialog
+
+// The add-in's own message box: a message, an icon by the message's kind,
+// OK, Cancel and Help, and a "do not show this again" check box.
+enum class PromptIcon : uint8_t { None, Critical, Question, Information };
+
+// What the prompt shows. Texts are UTF-8; the captions come from the
+// resource component.
+struct PromptView {
+  std::string message, title;
+  PromptIcon icon = PromptIcon::None;
+  std::string okCaption, cancelCaption, helpCaption, dontShowCaption;
+  bool helpAvailable = false;  // Help is enabled only then
+};
+
+// What the Help button does while the prompt stays open; `window` is the
+// prompt's own window.
+class PromptHelp {
+ public:
+  virtual ~PromptHelp() = default;
+  virtual void ShowHelp(int64_t window) = 0;
+};
+
+// How the user closed the prompt.
+struct PromptOutcome {
+  bool cancelled = false;  // Cancel (or the close box) rather than OK
+  bool dontShow = false;   // the check box was ticked
+};
+
 class UserInterface {
  public:
   virtual ~UserInterface() = default;
+  // Shows the prompt modally, owned by the window active on the calling
+  // thread (the host's main window while the host calls), until OK or
+  // Cancel.
+  virtual PromptOutcome ShowPrompt(const PromptView& view, PromptHelp& help) = 0;
   // A modal message box; returns the button pressed (kIdOk ...). An empty
   // title means the default one.
   virtual int MessageBox(std::string_view text, std::string_view title, uint32_t style) = 0;

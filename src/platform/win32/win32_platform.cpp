@@ -204,6 +204,10 @@ int Win32UserInterface::MessageBox(std::string_view text, std::string_view title
   return MessageBoxA(GetActiveWindow(), Utf8ToAnsi(text).c_str(), caption.c_str(), style);
 }
 
+platform::PromptOutcome Win32UserInterface::ShowPrompt(const platform::PromptView&, platform::PromptHelp&) {
+  throw kpx::AutomationError(kpx::vberr::kNotImplemented, "the prompt dialog is not built for Windows yet");
+}
+
 bool Win32UserInterface::WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) {
   return WinHelpA(reinterpret_cast<HWND>(static_cast<INT_PTR>(window)), Utf8ToAnsi(helpFile).c_str(), command,
                   static_cast<ULONG_PTR>(data)) != 0;

@@ -52,6 +52,7 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
 class Win32UserInterface final : public platform::UserInterface {
  public:
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
+  platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
 };
