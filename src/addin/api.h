@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdint>
 #include <map>
+#include <memory>
 #include <optional>
 #include <span>
 #include <vector>
@@ -43,6 +44,8 @@ enum class MenuText : uint8_t {
   EndSubmenu,           // "endsubmenu"
   Count
 };
+
+class CodeIconsHolder;
 
 class API final : public Object {
  public:
@@ -116,6 +119,10 @@ class API final : public Object {
   int32_t LanguageId();
   std::string GetLocation(const std::string& path, bool useDefault);
 
+  // The code icons, small and large: a keyed collection of pictures each.
+  ObjectPtr CodeIcons();
+  ObjectPtr LargeCodeIcons();
+
   // Host events around code generation and model update, and a new model.
   int32_t OnNewModel(ObjectPtr& QuarnApp);
   int32_t OnCodeUpdateStart(ObjectPtr& QuarnApp);
@@ -149,6 +156,7 @@ class API final : public Object {
   bool CheckComponent(const ObjectPtr& component);
   void SetMenuState(const char* key, bool enabled);
   void ExpandClassDiagram(const ObjectPtr& QuarnApp, const ObjectPtr& classes, bool clients);
+  CodeIconsHolder& TheCodeIconsHolder();
 
   Module& module_;
   ObjectPtr theFirstObject_;  // a companion cache the host never fills; cleared with the rest
@@ -169,6 +177,7 @@ class API final : public Object {
     std::optional<DispId> menuState, classKind, kindName;
   } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
+  std::unique_ptr<CodeIconsHolder> codeIconsHolder_;  // made on first use
 
  public:
   // Cleared when the user silences the matching warning.

@@ -49,18 +49,28 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
   ComBridge& bridge_;
 };
 
+// Icons come from `resources`, the module whose resources are the add-in's
+// (the program's own when null), and leave as OLE pictures.
 class Win32UserInterface final : public platform::UserInterface {
  public:
+  Win32UserInterface(ComBridge& bridge, HINSTANCE resources) : bridge_(bridge), resources_(resources) {}
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
+  ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override;
+
+ private:
+  ComBridge& bridge_;
+  HINSTANCE resources_;
 };
 
-// All of it, handed to the core as one platform::Platform.
+// All of it, handed to the core as one platform::Platform. `resources` is
+// the module the add-in's own resources (its icons) are loaded from.
 class Win32Platform {
  public:
-  explicit Win32Platform(ComBridge& bridge) : objects_(bridge) {}
+  explicit Win32Platform(ComBridge& bridge, HINSTANCE resources = nullptr)
+      : objects_(bridge), ui_(bridge, resources) {}
   Win32Platform(const Win32Platform&) = delete;
   Win32Platform& operator=(const Win32Platform&) = delete;
 
