@@ -28,6 +28,7 @@
 #include "check.h"
 #include "dialogs/code_icons.h"
 #include "host_object.h"
+#include "prompt_tests.h"
 #include "platform/win32/com_bridge.h"
 #include "platform/win32/dispatch_object.h"
 #include "platform/win32/object_dispatch.h"
@@ -1112,6 +1113,13 @@ int main(int argc, char** argv) {
   ObservedServing();
   PlatformOverWin32(paths, addin);
   CodeIcons();
+  // A window needs a screen (run.sh gives the run one).
+  if (!addin)
+    std::printf("prompt window: not tested, kpxaddin.dll did not load\n");
+  else if (GetEnvironmentVariableW(L"DISPLAY", nullptr, 0) == 0)
+    std::printf("prompt window: not tested, there is no display (DISPLAY)\n");
+  else
+    PromptWindowTests(addin);
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);
 

@@ -15,6 +15,7 @@
 
 #include "automation/object.h"
 #include "automation/vb_strings.h"
+#include "model/element_events.h"
 #include "shared/module.h"
 
 namespace kpx {
@@ -123,6 +124,12 @@ class API final : public Object {
   ObjectPtr CodeIcons();
   ObjectPtr LargeCodeIcons();
 
+  // The user drawing and changing the model.
+  void OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
+  void OnModifiedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem, int32_t aintReason);
+  void OnDeletedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
+  ElementEvents& elementEvents() { return elementEvents_; }
+
   // Host events around code generation and model update, and a new model.
   int32_t OnNewModel(ObjectPtr& QuarnApp);
   int32_t OnCodeUpdateStart(ObjectPtr& QuarnApp);
@@ -178,13 +185,9 @@ class API final : public Object {
   } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
   std::unique_ptr<CodeIconsHolder> codeIconsHolder_;  // made on first use
-
- public:
-  // Cleared when the user silences the matching warning.
-  bool WarnReversedRealize = false;
-  bool WarnRealizeNonInterface = false;
-  bool WarnCoclassModified = false;
-  bool WarnMultipleInterfaceBase = false;
+  // The element events' state: their warning flags, cached settings and
+  // the ATL assistant.
+  ElementEvents elementEvents_;
 };
 
 // Creates the add-in object as the host does.

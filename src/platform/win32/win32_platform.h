@@ -49,11 +49,13 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
   ComBridge& bridge_;
 };
 
-// Icons come from `resources`, the module whose resources are the add-in's
-// (the program's own when null), and leave as OLE pictures.
+// `resources` is the module holding the add-in's own resources (its DLL):
+// the dialog templates, without which the prompt cannot be shown, and the
+// icons, which leave as OLE pictures (the program's own module when null).
 class Win32UserInterface final : public platform::UserInterface {
  public:
-  Win32UserInterface(ComBridge& bridge, HINSTANCE resources) : bridge_(bridge), resources_(resources) {}
+  explicit Win32UserInterface(ComBridge& bridge, HINSTANCE resources = nullptr)
+      : bridge_(bridge), resources_(resources) {}
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
@@ -65,10 +67,10 @@ class Win32UserInterface final : public platform::UserInterface {
   HINSTANCE resources_;
 };
 
-// All of it, handed to the core as one platform::Platform. `resources` is
-// the module the add-in's own resources (its icons) are loaded from.
+// All of it, handed to the core as one platform::Platform.
 class Win32Platform {
  public:
+  // `resources`: as for Win32UserInterface.
   explicit Win32Platform(ComBridge& bridge, HINSTANCE resources = nullptr)
       : objects_(bridge), ui_(bridge, resources) {}
   Win32Platform(const Win32Platform&) = delete;
