@@ -146,6 +146,9 @@ class RecordingFileSystem final : public platform::FileSystem {
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
+  // Recorded as "file-read" with the path and whether it opened, not with
+  // the text: the model file already shows what the file holds.
+  std::string ReadText(std::string_view path) override;
 
  private:
   platform::FileSystem& inner_;
