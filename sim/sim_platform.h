@@ -157,7 +157,8 @@ class RecordingFileSystem final : public platform::FileSystem {
 };
 
 // Lays out the model's folders and files before the run. The platform's
-// file interface only appends and deletes, so this is the sim's own door:
+// file interface makes no folders and writes no whole files, so this is the
+// sim's own door:
 // `hostPath` maps a Windows path to where it really lies. Each raises
 // WorldError when the file system refuses.
 class FileSeeder {
