@@ -7,7 +7,7 @@ WIN32_DIR  := $(BUILD)/win-x86
 FUZZ_DIR   := $(BUILD)/fuzz
 FUZZ_SECONDS ?= 60
 
-.PHONY: all setup native windows wintest test demo bench bench-com fuzz clean
+.PHONY: all setup native windows wintest test demo bench bench-com fuzz pictures clean
 
 all: native
 
@@ -56,6 +56,10 @@ fuzz:
 	CC=clang CXX=clang++ cmake -S . -B $(FUZZ_DIR) -DCMAKE_BUILD_TYPE=RelWithDebInfo -DKPX_FUZZ=ON
 	cmake --build $(FUZZ_DIR) -j $(JOBS) --target fuzz-all
 	FUZZ_SECONDS=$(FUZZ_SECONDS) scripts/fuzz.sh $(FUZZ_DIR) $(FUZZ_TARGETS)
+
+# docs/pictures/: the add-in's dialogs as the real DLL shows them under Wine.
+pictures:
+	BUILD=$(BUILD) scripts/pictures.sh
 
 clean:
 	rm -rf $(BUILD)

@@ -17,6 +17,7 @@
 #include <string>
 
 #include "bench_model.h"
+#include "sim_host.h"
 #include "host_meter.h"
 #include "platform/posix/posix_platform.h"
 #include "sim/json_source.h"
@@ -26,62 +27,15 @@
 namespace kpx::sim {
 namespace {
 
-// A throw-away sandbox for the simulated drives.
-class Sandbox {
- public:
-  Sandbox() {
-    static std::atomic<int> counter{0};
-    path_ = std::filesystem::temp_directory_path() /
-            ("kpx-bench-host-calls-" + std::to_string(reinterpret_cast<uintptr_t>(this)) + "-" +
-             std::to_string(counter++));
-    std::filesystem::create_directories(path_);
-  }
-  ~Sandbox() {
-    std::error_code ignored;
-    std::filesystem::remove_all(path_, ignored);
-  }
-  Sandbox(const Sandbox&) = delete;
-  Sandbox& operator=(const Sandbox&) = delete;
-  const std::filesystem::path& path() const { return path_; }
-
- private:
-  std::filesystem::path path_;
-};
-
 // The model loaded through the library, the add-in object made and
 // activated once, as the host does at start-up.
-class ActivatedHost {
+class ActivatedHost : public bench::SimHost {
  public:
-  ActivatedHost()
-      : source_("bench-model.json", bench::kHostCallsModel),
-        model_(LoadModel(source_)),
-        files_(sandbox_.path()),
-        seeder_([this](std::string_view p) { return files_.HostPath(p); }),
-        sim_(model_, Environment{registry_, files_, seeder_}) {
-    sim_.Prepare();
-    sim_.Create();
-    app_ = sim_.world().application();
-    sim_.api()->OnActivate(app_);
-  }
-
-  API& api() { return *sim_.api(); }
+  ActivatedHost() : SimHost(bench::kHostCallsModel) { api().OnActivate(app_); }
   ObjectPtr& app() { return app_; }
-  uint64_t hostCalls() const { return sim_.log().hostCalls(); }
-  void Observe(CallObserver* observer) { sim_.log().Observe(observer); }
-  // The events are not read; keep memory flat over millions of calls.
-  void DropEvents() {
-    if (sim_.log().events().size() > 4096) sim_.log().Clear();
-  }
 
  private:
-  Sandbox sandbox_;
-  JsonSource source_;
-  ModelDef model_;
-  posix::FileRegistry registry_;  // in memory: no file behind it
-  posix::SandboxFileSystem files_;
-  FileSeeder seeder_;
-  Simulation sim_;
-  ObjectPtr app_;
+  ObjectPtr app_ = SimHost::app();
 };
 
 void BM_Name(benchmark::State& state) {

@@ -1,3 +1,4 @@
+#include <set>
 #include <gtest/gtest.h>
 
 #include "addin/api.h"
@@ -91,8 +92,9 @@ TEST_F(ApiTest, ConstructionLoadsMessagesThenMenuTextsInOrder) {
   EXPECT_EQ(api->menuText(MenuText::AtlSubmenu), "Submenu T5040");
   EXPECT_EQ(api->menuText(MenuText::ExpandSubmenu), "Submenu T5051");
   EXPECT_EQ(api->menuText(MenuText::EndSubmenu), "endsubmenu");
-  EXPECT_TRUE(api->WarnReversedRealize && api->WarnRealizeNonInterface && api->WarnCoclassModified &&
-              api->WarnMultipleInterfaceBase);
+  const ElementEvents& events = api->elementEvents();
+  EXPECT_TRUE(events.WarnReversedRealize && events.WarnRealizeNonInterface && events.WarnCoclassModified &&
+              events.WarnMultipleInterfaceBase);
 }
 
 TEST_F(ApiTest, ConstructionFailsWithoutTheResourceComponent) {
@@ -301,10 +303,15 @@ TEST_F(ApiTest, EveryBuiltMemberBeginsWithItsTraceLine) {
       {"OnUser2", "BEGIN kpxAddin.OnUser2"},
       {"OnUser3", "BEGIN kpxAddin.OnUser3"},
       {"OnUser4", "BEGIN kpxAddin.OnUser4"},
-      {"OnUser5", "BEGIN kpxAddin.OnUser5"}};
+      {"OnUser5", "BEGIN kpxAddin.OnUser5"},
+      {"OnDeletedModelElement", ""}};  // does nothing, so writes nothing
+  // The element events write their own line only after reading the model's
+  // settings, which this bare host lacks; the scenarios pin those lines.
+  const std::set<std::string> afterSettings = {"OnNewModelElement", "OnModifiedModelElement"};
   int checked = 0;
   for (const ApiMember& m : ApiMembers()) {
     if (!m.call) continue;  // not built: answers "not implemented" and logs nothing
+    if (afterSettings.count(m.name)) continue;
     world.files.at("C:\\tzndebuglog.txt").clear();
     std::vector<Variant> values;
     for (uint8_t i = 0; i < m.paramCount; ++i) {
@@ -327,7 +334,10 @@ TEST_F(ApiTest, EveryBuiltMemberBeginsWithItsTraceLine) {
     const std::string first = log.substr(0, log.find("\r\n"));
     auto it = own.find(m.name);
     const std::string expected = it != own.end() ? it->second : EntryTraceLine(m.name);
-    EXPECT_EQ(first, std::string(" TRACE    ADDIN     ") + expected) << m.name;
+    if (expected.empty())
+      EXPECT_EQ(log, "") << m.name;
+    else
+      EXPECT_EQ(first, std::string(" TRACE    ADDIN     ") + expected) << m.name;
     ++checked;
   }
   EXPECT_GE(checked, 50);

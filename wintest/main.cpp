@@ -24,6 +24,7 @@
 #include "calls.h"
 #include "check.h"
 #include "host_object.h"
+#include "prompt_tests.h"
 #include "platform/win32/com_bridge.h"
 #include "platform/win32/dispatch_object.h"
 #include "platform/win32/win32_platform.h"
@@ -968,6 +969,13 @@ int main(int argc, char** argv) {
   BridgeAgainstHostObjects();
   ObservedServing();
   PlatformOverWin32(paths);
+  // A window needs a screen (run.sh gives the run one).
+  if (!addin)
+    std::printf("prompt window: not tested, kpxaddin.dll did not load\n");
+  else if (GetEnvironmentVariableW(L"DISPLAY", nullptr, 0) == 0)
+    std::printf("prompt window: not tested, there is no display (DISPLAY)\n");
+  else
+    PromptWindowTests(addin);
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);
 

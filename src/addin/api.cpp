@@ -27,7 +27,7 @@ constexpr std::string_view kHostApplicationHolderInterfaceId = "{DDA8932A-8C47-1
 
 }  // namespace
 
-API::API(Module& module) : module_(module) {
+API::API(Module& module) : module_(module), elementEvents_(module) {
   ResourceStrings& res = module_.resources();
   res.InitResourceStrings();
   theFirstObject_ = nullptr;
@@ -36,10 +36,10 @@ API::API(Module& module) : module_(module) {
   menuTexts_[static_cast<size_t>(MenuText::AtlSubmenu)] = "Submenu " + res.LoadResString(5040);
   menuTexts_[static_cast<size_t>(MenuText::ExpandSubmenu)] = "Submenu " + res.LoadResString(5051);
   menuTexts_[static_cast<size_t>(MenuText::EndSubmenu)] = "endsubmenu";
-  WarnReversedRealize = true;
-  WarnRealizeNonInterface = true;
-  WarnCoclassModified = true;
-  WarnMultipleInterfaceBase = true;
+  elementEvents_.WarnReversedRealize = true;
+  elementEvents_.WarnRealizeNonInterface = true;
+  elementEvents_.WarnCoclassModified = true;
+  elementEvents_.WarnMultipleInterfaceBase = true;
 }
 
 API::~API() {
@@ -241,6 +241,21 @@ int32_t API::OnAppInit(ObjectPtr&) {
   module_.DebugLog("kpxAddin.OnAppInit(QuarnApp)", logid::ADDIN, loglevel::TRACE);
   return 0;
 }
+
+// ------------------------------------------------------- element events
+
+void API::OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem) {
+  elementEvents_.OnNewModelElement(armiQuarnApp, armiQuarnItem);
+}
+
+void API::OnModifiedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem,
+                                 int32_t aintReason) {
+  elementEvents_.OnModifiedModelElement(armiQuarnApp, armiQuarnItem, aintReason);
+}
+
+// A deleted element needs nothing: the ATL object classes keep their code
+// until the user changes them.
+void API::OnDeletedModelElement(const ObjectPtr&, const ObjectPtr&) {}
 
 int32_t API::OnNewModel(ObjectPtr&) {
   TraceEntry("OnNewModel");

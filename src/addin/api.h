@@ -14,6 +14,7 @@
 
 #include "automation/object.h"
 #include "automation/vb_strings.h"
+#include "model/element_events.h"
 #include "shared/module.h"
 
 namespace kpx {
@@ -129,6 +130,12 @@ class API final : public Object {
   int32_t OnImportATL(ObjectPtr& QuarnApp);
   int32_t RenderClass(ObjectPtr& QuarnApp, ObjectPtr& aClass);
 
+  // The user drawing and changing the model.
+  void OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
+  void OnModifiedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem, int32_t aintReason);
+  void OnDeletedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
+  ElementEvents& elementEvents() { return elementEvents_; }
+
   // Host events around code generation and model update, and a new model.
   int32_t OnNewModel(ObjectPtr& QuarnApp);
   int32_t OnCodeUpdateStart(ObjectPtr& QuarnApp);
@@ -193,13 +200,9 @@ class API final : public Object {
     std::optional<DispId> activeDiagram, addClass, clientClasses, supplierClasses;
   } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
-
- public:
-  // Cleared when the user silences the matching warning.
-  bool WarnReversedRealize = false;
-  bool WarnRealizeNonInterface = false;
-  bool WarnCoclassModified = false;
-  bool WarnMultipleInterfaceBase = false;
+  // The element events' state: their warning flags, cached settings and
+  // the ATL assistant.
+  ElementEvents elementEvents_;
 };
 
 // Creates the add-in object as the host does.

@@ -154,10 +154,22 @@ const std::array<ApiMember, kApiMemberCount> kMembers = {{
     Cmd("OnImportATL", [](API& a, Args x) -> Variant { return a.OnImportATL(ObjectArg(x[0])); }),
     M("RenderClass", T::Int32, {App, Obj("aClass"), None, None}, 2,
       [](API& a, Args x) -> Variant { return a.RenderClass(ObjectArg(x[0]), ObjectArg(x[1])); }),
-    M("OnNewModelElement", T::None, {Obj("armiQuarnApp"), Obj("armiQuarnItem"), None, None}, 2),
+    M("OnNewModelElement", T::None, {Obj("armiQuarnApp"), Obj("armiQuarnItem"), None, None}, 2,
+      [](API& a, Args x) -> Variant {
+        a.OnNewModelElement(x[0].toObject(), x[1].toObject());
+        return {};
+      }),
     M("OnModifiedModelElement", T::None,
-      {Obj("armiQuarnApp"), Obj("armiQuarnItem"), ApiParam{"aintReason", T::Int32, true, false}, None}, 3),
-    M("OnDeletedModelElement", T::None, {Obj("armiQuarnApp"), Obj("armiQuarnItem"), None, None}, 2),
+      {Obj("armiQuarnApp"), Obj("armiQuarnItem"), ApiParam{"aintReason", T::Int32, true, false}, None}, 3,
+      [](API& a, Args x) -> Variant {
+        a.OnModifiedModelElement(x[0].toObject(), x[1].toObject(), x[2].toInt32());
+        return {};
+      }),
+    M("OnDeletedModelElement", T::None, {Obj("armiQuarnApp"), Obj("armiQuarnItem"), None, None}, 2,
+      [](API& a, Args x) -> Variant {
+        a.OnDeletedModelElement(x[0].toObject(), x[1].toObject());
+        return {};
+      }),
 }};
 
 }  // namespace

@@ -71,7 +71,7 @@ struct AddInLibrary::State {
           if (dynamic_cast<const TokenScannerObject*>(&o)) return TypeInfos::OrNull(types.scanner);
           return nullptr;
         }),
-        platform(bridge),
+        platform(bridge, instance),
         module(platform.platform()) {}
 };
 

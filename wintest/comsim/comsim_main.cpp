@@ -9,8 +9,11 @@
 //
 // The add-in's message boxes are real ones: a watcher (ScriptedUser)
 // presses on each the button the scenario queued, OK when none is left, as
-// the native run's scripted user answers; the help viewer the add-in starts
-// is ended after the run. Such scenarios need a display (run.sh gives them
+// the native run's scripted user answers. Its prompts are real windows too:
+// the watcher reads each off the screen into the simulator's view of it,
+// which logs it and picks the answer, and plays that answer on the window
+// (Help, the tick, OK or Cancel). The help viewer the add-in starts is
+// ended after the run. Such scenarios need a display (run.sh gives them
 // one with xvfb-run); without one they are reported as skipped.
 //
 // Its event log is then held against the native run's golden log, leaving
@@ -18,8 +21,9 @@
 //  - the add-in's own calls to its platform (registry-*, file-*, sleep,
 //    doevents, help): in the DLL they go straight to Win32, past any host
 //    object, so no COM host can record them. WinHelpA hands its arguments
-//    to the help viewer, another process; a message box, though, is seen
-//    on the screen: its text, title, buttons and answer are compared;
+//    to the help viewer, another process; a message box or a prompt,
+//    though, is seen on the screen: its texts, buttons and answer are
+//    compared;
 //  - the kind of a companion's call when it is a get or a method: a call
 //    through IDispatch asks for both at once;
 //  - the debug log events: compared instead with the real log file the DLL
@@ -262,10 +266,11 @@ int Main(int argc, char** argv) {
   const std::string golden = ReadAll(argv[2]);
   // A real message box needs a screen to be shown on.
   bool userInterface = golden.find("\"ev\":\"messagebox\"") != std::string::npos ||
+                       golden.find("\"ev\":\"prompt\"") != std::string::npos ||
                        golden.find("\"ev\":\"help\"") != std::string::npos;
   for (const Action& a : scenario.actions) userInterface = userInterface || a.type == Action::Type::Answer;
   if (userInterface && GetEnvironmentVariableW(L"DISPLAY", nullptr, 0) == 0) {
-    std::printf("  skipped: the add-in shows a message box or help, and there is no display (DISPLAY)\n");
+    std::printf("  skipped: the add-in shows a message box, a prompt or help, and there is no display (DISPLAY)\n");
     return 3;
   }
 

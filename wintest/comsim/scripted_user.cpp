@@ -6,7 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "platform/win32/win32_strings.h"
+#include "platform/win32/prompt_window_ids.h"
+#include "prompt_reader.h"
 
 namespace wintest {
 
@@ -21,16 +22,9 @@ std::wstring ClassOf(HWND window) {
   return name;
 }
 
-std::string TextOf(HWND window) {
-  const int n = GetWindowTextLengthW(window);
-  std::wstring text(static_cast<size_t>(n) + 1, L'\0');
-  text.resize(static_cast<size_t>(GetWindowTextW(window, text.data(), n + 1)));
-  return kpx::win32::WideToUtf8(text);
-}
-
 BOOL CALLBACK FirstText(HWND child, LPARAM out) {
   if (_wcsicmp(ClassOf(child).c_str(), L"Static") != 0 || GetWindowTextLengthW(child) == 0) return TRUE;
-  *reinterpret_cast<std::string*>(out) = TextOf(child);
+  *reinterpret_cast<std::string*>(out) = WindowText(child);
   return FALSE;
 }
 
@@ -140,13 +134,36 @@ LRESULT CALLBACK ScriptedUser::WindowProc(HWND window, UINT message, WPARAM wPar
   return DefWindowProcW(window, message, wParam, lParam);
 }
 
+// Help pressed on the real prompt reaches the add-in's own Help (and the
+// real WinHelpA) through the window; the simulator is only told of it.
+struct HelpAsked final : kpx::platform::PromptHelp {
+  bool asked = false;
+  void ShowHelp(int64_t) override { asked = true; }
+};
+
 void ScriptedUser::Answer(HWND box) {
   for (auto it = answered_.begin(); it != answered_.end();) it = IsWindow(*it) ? std::next(it) : answered_.erase(it);
   if (!IsWindow(box) || !IsWindowVisible(box) || answered_.count(box)) return;
   answered_.insert(box);
-  const int button = answers_.MessageBox(MessageOf(box), TextOf(box), ButtonsOf(box));
+  if (IsPromptWindow(box)) {
+    AnswerPrompt(box);
+    return;
+  }
+  const int button = answers_.MessageBox(MessageOf(box), WindowText(box), ButtonsOf(box));
   // What a click on the button sends; the box ends with that id.
   PostMessageW(box, WM_COMMAND, MAKEWPARAM(button, BN_CLICKED), reinterpret_cast<LPARAM>(GetDlgItem(box, button)));
+}
+
+// The prompt as the simulator sees it, read off the window; then what the
+// scenario says, played on the window in a user's order: Help, the tick,
+// the closing button. Each click is handled before the next is made.
+void ScriptedUser::AnswerPrompt(HWND prompt) {
+  HelpAsked help;
+  const kpx::platform::PromptOutcome outcome = answers_.ShowPrompt(ReadPrompt(prompt).view, help);
+  if (help.asked) Click(prompt, IDHELP);
+  if (!IsWindow(prompt)) return;
+  if (outcome.dontShow) Click(prompt, KPX_PROMPT_DONT_SHOW);
+  Click(prompt, outcome.cancelled ? IDCANCEL : IDOK);
 }
 
 int ScriptedUser::EndChildren() {

@@ -1,6 +1,7 @@
 // The user at the test host's screen, as the native run scripts it: the
 // add-in's real message boxes are answered with the buttons the scenario
-// queued (OK when none is left), and whatever the add-in started on the way
+// queued (OK when none is left), its prompts with the queued prompt answers
+// (Help, the tick, OK or Cancel), and whatever the add-in started on the way
 // (the help viewer) is ended after the run.
 #pragma once
 
@@ -14,7 +15,7 @@ namespace wintest {
 
 class ScriptedUser {
  public:
-  // `answers` picks the button of each box (and logs the box); it is only
+  // `answers` picks the button of each box and prompt (and logs it); it is only
   // ever called on the thread that made this object, inside the add-in's
   // own message loop.
   explicit ScriptedUser(kpx::platform::UserInterface& answers);
@@ -30,6 +31,7 @@ class ScriptedUser {
   static LRESULT CALLBACK WindowProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam);
   static DWORD WINAPI Watch(void* self);
   void Answer(HWND box);
+  void AnswerPrompt(HWND prompt);
 
   kpx::platform::UserInterface& answers_;
   HWND window_ = nullptr;   // message-only, on the add-in's thread

@@ -3,6 +3,7 @@
 #include "automation/automation_error.h"
 #include "platform/win32/com_errors.h"
 #include "platform/win32/dispatch_object.h"
+#include "platform/win32/prompt_window.h"
 #include "platform/win32/win32_strings.h"
 #include "shared/resource_strings.h"
 
@@ -227,8 +228,8 @@ int Win32UserInterface::MessageBox(std::string_view text, std::string_view title
   return MessageBoxA(GetActiveWindow(), Utf8ToAnsi(text).c_str(), caption.c_str(), style);
 }
 
-platform::PromptOutcome Win32UserInterface::ShowPrompt(const platform::PromptView&, platform::PromptHelp&) {
-  throw kpx::AutomationError(kpx::vberr::kNotImplemented, "the prompt dialog is not built for Windows yet");
+platform::PromptOutcome Win32UserInterface::ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) {
+  return ShowPromptWindow(resources_, GetActiveWindow(), view, help);
 }
 
 bool Win32UserInterface::WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) {

@@ -50,18 +50,25 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
   ComBridge& bridge_;
 };
 
+// `resources` is the module holding the add-in's dialog templates (its
+// DLL); without it the prompt cannot be shown.
 class Win32UserInterface final : public platform::UserInterface {
  public:
+  explicit Win32UserInterface(HINSTANCE resources = nullptr) : resources_(resources) {}
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
+
+ private:
+  HINSTANCE resources_;
 };
 
 // All of it, handed to the core as one platform::Platform.
 class Win32Platform {
  public:
-  explicit Win32Platform(ComBridge& bridge) : objects_(bridge) {}
+  // `resources`: as for Win32UserInterface.
+  explicit Win32Platform(ComBridge& bridge, HINSTANCE resources = nullptr) : objects_(bridge), ui_(resources) {}
   Win32Platform(const Win32Platform&) = delete;
   Win32Platform& operator=(const Win32Platform&) = delete;
 

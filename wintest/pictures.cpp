@@ -1,0 +1,160 @@
+// kpx-pictures: pictures of the add-in's prompt window for the manual.
+// Each prompt is filled by the prompt form itself (its captions from the
+// registered resource component), shown from kpxaddin.dll's template, and
+// taken off the screen into a 24-bit BMP once it has drawn itself; then OK
+// closes it. scripts/pictures.sh runs it on a screen of its own and turns
+// the BMPs into PNGs.
+//
+// Usage: kpx-pictures <kpxaddin.dll> <output folder>   (Windows paths)
+
+// Taking the picture needs GDI.
+#undef NOGDI
+#include <windows.h>
+
+#include "platform/win32/win32_api.h"
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include "dialogs/kpx_prompt.h"
+#include "platform/win32/com_bridge.h"
+#include "platform/win32/win32_platform.h"
+#include "platform/win32/win32_strings.h"
+#include "prompt_reader.h"
+#include "shared/resource_strings.h"
+
+namespace {
+
+// The warnings as the element events show them: the resource component's
+// texts, "%1" filled with a relation's text.
+struct Picture {
+  const char* file;
+  const char* message;
+  const char* title;
+  int32_t kind;
+  int32_t helpContext;
+  const char* helpFile;
+};
+
+const Picture kPictures[] = {
+    {"prompt-inherit-information",
+     "The interface already has a base interface. An interface can have only one, so the older inherit relation "
+     "IShape is deleted.",
+     "Base interface replaced", 64, 0, ""},
+    {"prompt-realize-critical",
+     "A realize relation goes from a coclass to the interface it implements. This one goes from an interface to a "
+     "coclass and is left as drawn.",
+     "Realize relation", 16, 0, ""},
+    {"prompt-help-available",
+     "A coclass can realize only classes stereotyped \"interface\". This relation is left as drawn, and nothing is "
+     "implemented.",
+     "Realize relation", 16, 1050, "C:\\Program Files\\Quarn\\kpxaddin.hlp"},
+};
+
+struct Shot {
+  std::wstring path;
+  bool taken = false;
+};
+
+// The window's pixels as the screen shows them, bottom-up 24-bit rows.
+bool WriteBmp(HWND window, const std::wstring& path) {
+  RECT r;
+  GetWindowRect(window, &r);
+  const int width = r.right - r.left, height = r.bottom - r.top;
+  BITMAPINFO info = {};
+  info.bmiHeader.biSize = sizeof(BITMAPINFOHEADER);
+  info.bmiHeader.biWidth = width;
+  info.bmiHeader.biHeight = height;
+  info.bmiHeader.biPlanes = 1;
+  info.bmiHeader.biBitCount = 24;
+  info.bmiHeader.biCompression = BI_RGB;
+  void* bits = nullptr;
+  HDC screen = GetDC(nullptr);
+  HDC memory = CreateCompatibleDC(screen);
+  HBITMAP bitmap = CreateDIBSection(screen, &info, DIB_RGB_COLORS, &bits, nullptr, 0);
+  HGDIOBJ old = SelectObject(memory, bitmap);
+  const bool copied = BitBlt(memory, 0, 0, width, height, screen, r.left, r.top, SRCCOPY) != 0;
+  GdiFlush();
+  const size_t stride = (static_cast<size_t>(width) * 3 + 3) & ~size_t{3};
+  const size_t size = stride * static_cast<size_t>(height);
+  BITMAPFILEHEADER file = {};
+  file.bfType = 0x4D42;
+  file.bfOffBits = sizeof(BITMAPFILEHEADER) + sizeof(BITMAPINFOHEADER);
+  file.bfSize = static_cast<DWORD>(file.bfOffBits + size);
+  std::ofstream out(std::filesystem::path(path), std::ios::binary);
+  out.write(reinterpret_cast<const char*>(&file), sizeof file);
+  out.write(reinterpret_cast<const char*>(&info.bmiHeader), sizeof info.bmiHeader);
+  out.write(static_cast<const char*>(bits), static_cast<std::streamsize>(size));
+  const bool written = copied && out.good();
+  SelectObject(memory, old);
+  DeleteObject(bitmap);
+  DeleteDC(memory);
+  ReleaseDC(nullptr, screen);
+  return written;
+}
+
+DWORD WINAPI Photograph(void* param) {
+  auto* shot = static_cast<Shot*>(param);
+  HWND prompt = nullptr;
+  for (int waited = 0; waited < 10000 && !prompt; waited += 10) {
+    const std::vector<HWND> shown = wintest::ShownPrompts();
+    if (shown.empty())
+      Sleep(10);
+    else
+      prompt = shown.front();
+  }
+  if (!prompt) return 0;
+  // No window manager gives the prompt the focus on this screen: it is
+  // given here, so that it shows as the active window it is on a desktop.
+  SetForegroundWindow(prompt);
+  // Wine may still have drawn the frame as inactive from the moment the
+  // window appeared: the frame is drawn again as the active window's.
+  SendMessageW(prompt, WM_NCACTIVATE, TRUE, 0);
+  RedrawWindow(prompt, nullptr, nullptr, RDW_INVALIDATE | RDW_ERASE | RDW_FRAME | RDW_ALLCHILDREN | RDW_UPDATENOW);
+  Sleep(500);  // until the screen has what the window drew
+  shot->taken = WriteBmp(prompt, shot->path);
+  wintest::Click(prompt, IDOK);
+  return 0;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  if (argc != 3) {
+    std::fprintf(stderr, "usage: kpx-pictures <kpxaddin.dll> <output folder>\n");
+    return 2;
+  }
+  CoInitialize(nullptr);
+  HMODULE addin = LoadLibraryW(kpx::win32::Utf8ToWide(argv[1]).c_str());
+  if (!addin) {
+    std::fprintf(stderr, "kpx-pictures: cannot load %s\n", argv[1]);
+    return 1;
+  }
+  int failed = 0;
+  {
+    kpx::win32::ServerLocks locks;
+    kpx::win32::ComBridge bridge(locks);
+    kpx::win32::Win32Platform win32(bridge, addin);
+    kpx::platform::Platform world = win32.platform();
+    kpx::ResourceStrings resources(world.objects);
+    for (const Picture& p : kPictures) {
+      Shot shot{kpx::win32::Utf8ToWide(std::string(argv[2]) + "\\" + p.file + ".bmp")};
+      HANDLE thread = CreateThread(nullptr, 0, Photograph, &shot, 0, nullptr);
+      try {
+        kpx::KpxPrompt prompt(world.ui, resources);
+        prompt.Initialize(p.message, p.title, p.kind, false, p.helpContext, p.helpFile, false);
+      } catch (const std::exception& e) {
+        std::fprintf(stderr, "kpx-pictures: %s: %s\n", p.file, e.what());
+      }
+      WaitForSingleObject(thread, INFINITE);
+      CloseHandle(thread);
+      std::printf("%s: %s\n", p.file, shot.taken ? "taken" : "FAILED");
+      if (!shot.taken) ++failed;
+    }
+  }
+  CoUninitialize();
+  return failed == 0 ? 0 : 1;
+}
