@@ -1,5 +1,6 @@
 #include "sim/host_objects.h"
 
+#include <algorithm>
 #include <map>
 
 #include "automation/vb_strings.h"
@@ -75,8 +76,11 @@ constexpr MemberName kAddInNames[] = {
     {id::kEventHandler, simid::kEventHandler},
     {"AddContextMenuItem", id::kAddContextMenuItem},
 };
+// GetActiveDiagram last: a host without diagram members lacks it.
 constexpr MemberName kModelNames[] = {{"GetSelectedItems", id::kGetSelectedItems},
-                                      {"GetPropertyValue", id::kGetPropertyValue}};
+                                      {"GetPropertyValue", id::kGetPropertyValue},
+                                      {"GetActiveDiagram", simid::kGetActiveDiagram}};
+constexpr MemberName kDiagramNames[] = {{"Name", id::kName}, {"AddClass", simid::kAddClass}};
 constexpr MemberName kClassKindNames[] = {{"Name", id::kName}};
 constexpr MemberName kPackageNames[] = {{"KindTest", id::kKindTest}, {"Name", id::kName}};
 constexpr MemberName kUnitNames[] = {{"IsModifiable", id::kKindTest}};
@@ -84,6 +88,10 @@ constexpr MemberName kPropertyNames[] = {{"Name", id::kName}, {"Value", simid::k
 
 std::span<const MemberName> AddInNames(bool contextMenus) {
   return std::span<const MemberName>(kAddInNames, contextMenus ? std::size(kAddInNames) : std::size(kAddInNames) - 1);
+}
+
+std::span<const MemberName> ModelNames(bool diagramMembers) {
+  return std::span<const MemberName>(kModelNames, diagramMembers ? std::size(kModelNames) : std::size(kModelNames) - 1);
 }
 
 }  // namespace
@@ -329,15 +337,38 @@ Variant ApplicationObject::Call(DispId dispId, CallKind kind, std::span<Variant>
 
 // --------------------------------------------------------------- ModelObject
 
-std::span<const MemberName> ModelObject::Names() const { return kModelNames; }
+std::span<const MemberName> ModelObject::Names() const { return ModelNames(world_.def().diagramMembers); }
 
 Variant ModelObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
   if (dispId == id::kGetSelectedItems) {
     Read(kind, args);
     return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:selection", world_.SelectedItems(), true));
   }
+  if (dispId == simid::kGetActiveDiagram) {
+    Read(kind, args);
+    return world_.diagram();
+  }
   Read(kind, args, 2);
   return LookUp(world_.def().modelProperties, args[0].toString(), args[1].toString()).value_or("");
+}
+
+// ------------------------------------------------------------- DiagramObject
+
+std::span<const MemberName> DiagramObject::Names() const { return kDiagramNames; }
+
+Variant DiagramObject::Call(DispId dispId, CallKind kind, std::span<Variant> args) {
+  if (dispId == id::kName) {
+    Read(kind, args);
+    return def_.name;
+  }
+  Read(kind, args, 1);
+  auto* cls = dynamic_cast<ElementObject*>(args[0].toObject().get());
+  if (!cls || cls->kind() != "Class") throw AutomationError(vberr::kInvalidCall, "only classes go on a class diagram");
+  const std::string& key = cls->def().key;
+  if (std::find(shown_.begin(), shown_.end(), key) != shown_.end()) return false;
+  shown_.push_back(key);
+  world_.log().Add({{"ev", "diagram-add"}, {"diagram", def_.name}, {"class", key}});
+  return true;
 }
 
 // ------------------------------------------------------------- ElementObject
@@ -379,6 +410,10 @@ const NameTable& NamesFor(const std::string& kind) {
                                   {"GetAssignedLanguage", simid::kGetAssignedLanguage},
                                   {"GetRelatedClasses", simid::kGetRelatedClasses},
                               }});
+    // A host without diagram members: the class lacks the last two.
+    t["Class/no-diagram"] = t["Class"];
+    t["Class"].insert(t["Class"].end(), {{"GetClientClasses", simid::kGetClientClasses},
+                                         {"GetSupplierClasses", simid::kGetSupplierClasses}});
     t["Module"] = with(common, {{{"Language", id::kModuleLanguage}}});
     t["Attribute"] = with(common, {{{"ParentClass", id::kAttributeParentClass}}});
     t["Operation"] = with(common, {{{"ParentClass", id::kOperationParentClass}}});
@@ -404,6 +439,11 @@ const NameTable& NamesFor(const std::string& kind) {
   return kTables.at(kind);
 }
 
+const NameTable& NamesFor(const std::string& kind, bool diagramMembers) {
+  static const std::string kBareClass = "Class/no-diagram";
+  return NamesFor(kind == "Class" && !diagramMembers ? kBareClass : kind);
+}
+
 // The relation kind GetRelatedClasses(0, n) follows.
 std::string_view RelatedKind(int32_t n) {
   switch (n) {
@@ -421,7 +461,42 @@ std::string_view RelatedKind(int32_t n) {
 ElementObject::ElementObject(World& world, const ElementDef& def)
     : HostObject(world), def_(def), name_(def.name), stereotype_(def.stereotype), properties_(def.properties) {}
 
-std::span<const MemberName> ElementObject::Names() const { return NamesFor(def_.kind); }
+std::span<const MemberName> ElementObject::Names() const {
+  return NamesFor(def_.kind, world_.def().diagramMembers);
+}
+
+std::vector<ObjectPtr> ElementObject::RelatedClasses(bool suppliers) const {
+  // (place in the model, class) of every relation and association that
+  // makes a class a supplier or a client of this one, then in model order.
+  std::vector<std::pair<size_t, std::string_view>> found;
+  const auto& elements = world_.elements();
+  for (size_t i : suppliers ? world_.RelationsFrom(def_.key) : world_.RelationsTo(def_.key)) {
+    const ElementObject& r = *elements[i];
+    if (!r.removed()) found.emplace_back(i, suppliers ? r.def().supplier : r.def().client);
+  }
+  // Across an association, the class at a navigable role is a supplier of
+  // the class at the other role, which is its client.
+  for (size_t ownPlace : world_.RolesAt(def_.key)) {
+    const ElementDef& own = elements[ownPlace]->def();
+    for (size_t a : world_.AssociationsOf(own.key)) {
+      const ElementDef& association = elements[a]->def();
+      const std::string& otherKey = association.role1 == own.key ? association.role2 : association.role1;
+      auto other = world_.FindElement(otherKey);
+      if (other && (suppliers ? other->def().navigable : own.navigable)) found.emplace_back(a, other->def().roleClass);
+    }
+  }
+  std::stable_sort(found.begin(), found.end(), [](const auto& x, const auto& y) { return x.first < y.first; });
+  std::vector<ObjectPtr> classes;
+  std::vector<std::string_view> seen;
+  for (const auto& [place, key] : found) {
+    if (key == def_.key || std::find(seen.begin(), seen.end(), key) != seen.end()) continue;
+    auto cls = world_.FindElement(key);
+    if (!cls || cls->kind() != "Class") continue;
+    seen.push_back(key);
+    classes.push_back(cls);
+  }
+  return classes;
+}
 
 ObjectPtr ElementObject::Ref(const std::string& key) const {
   if (key.empty()) return nullptr;
@@ -549,6 +624,14 @@ Variant ElementObject::Call(DispId dispId, CallKind kind, std::span<Variant> arg
       return ObjectPtr(std::make_shared<CollectionObject>(world_, "collection:" + key + ".related", items, true));
     }
 
+    case simid::kGetClientClasses:
+    case simid::kGetSupplierClasses: {
+      Read(kind, args);
+      const bool suppliers = dispId == simid::kGetSupplierClasses;
+      return ObjectPtr(std::make_shared<CollectionObject>(
+          world_, "collection:" + key + (suppliers ? ".suppliers" : ".clients"), RelatedClasses(suppliers), true));
+    }
+
     // ---- attribute, operation
     case id::kAttributeParentClass:
     case id::kOperationParentClass:
@@ -633,18 +716,22 @@ std::optional<std::span<const MemberName>> HostMembersOf(const ModelDef& model, 
   if (label == "$app") return Names(kApplicationNames);
   if (label == "$app.AddInManager") return Names(kManagerNames);
   if (label == "$app.AddIns") return Names(kCollectionNames, 2);
-  if (label == "$model") return Names(kModelNames);
+  if (label == "$model") return ModelNames(model.diagramMembers);
+  if (auto name = after("diagram:")) {
+    if (model.diagram && model.diagram->name == *name) return Names(kDiagramNames);
+    return std::nullopt;
+  }
   if (auto id = after("addin:")) {
     const AddInDef* a = model.FindAddIn(*id);
     if (a) return AddInNames(a->contextMenus);
   } else if (auto key = after("element:")) {
     const std::string kind = kindOf(*key);
-    if (!kind.empty()) return Names(NamesFor(kind));
+    if (!kind.empty()) return Names(NamesFor(kind, model.diagramMembers));
   } else if (after("menu:")) {
     return Names(kMenuEntryNames);
   } else if (auto what = after("collection:")) {
     if (*what == "selection") return Names(kCollectionNames);
-    for (std::string_view list : {".components", ".inherits", ".related"})
+    for (std::string_view list : {".components", ".inherits", ".related", ".clients", ".suppliers"})
       if (what->size() > list.size() && what->substr(what->size() - list.size()) == list &&
           kindOf(what->substr(0, what->size() - list.size())) == "Class")
         return Names(kCollectionNames);

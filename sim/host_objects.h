@@ -39,6 +39,10 @@ inline constexpr DispId kRole2 = 30008;
 inline constexpr DispId kAssociation = 30009;
 inline constexpr DispId kValue = 30010;
 inline constexpr DispId kToolName = 30011;
+inline constexpr DispId kGetActiveDiagram = 30012;
+inline constexpr DispId kAddClass = 30013;
+inline constexpr DispId kGetClientClasses = 30014;
+inline constexpr DispId kGetSupplierClasses = 30015;
 inline constexpr DispId kAdd = 208;
 inline constexpr DispId kRemoveAll = 211;
 }  // namespace simid
@@ -168,6 +172,23 @@ class ModelObject final : public HostObject {
   Variant Call(DispId id, CallKind kind, std::span<Variant> args) override;
 };
 
+// The class diagram the user works in: its Name, and AddClass(class), which
+// shows the class on it (True) unless it shows it already (False).
+class DiagramObject final : public HostObject {
+ public:
+  DiagramObject(World& world, const DiagramDef& def) : HostObject(world), def_(def), shown_(def.classes) {}
+  std::string label() const override { return "diagram:" + def_.name; }
+  const std::vector<std::string>& shown() const { return shown_; }
+
+ protected:
+  std::span<const MemberName> Names() const override;
+  Variant Call(DispId id, CallKind kind, std::span<Variant> args) override;
+
+ private:
+  const DiagramDef& def_;
+  std::vector<std::string> shown_;  // class keys, in the order they came
+};
+
 class ElementObject final : public HostObject {
  public:
   ElementObject(World& world, const ElementDef& def);
@@ -185,6 +206,8 @@ class ElementObject final : public HostObject {
  private:
   void RecordWrite(std::string_view member, EventJson fields);
   ObjectPtr Ref(const std::string& key) const;
+  // The classes this class depends on (suppliers) or that depend on it.
+  std::vector<ObjectPtr> RelatedClasses(bool suppliers) const;
   std::string RoleClassOf(const std::string& roleKey) const;
 
   const ElementDef& def_;

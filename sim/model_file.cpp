@@ -406,7 +406,7 @@ class ModelReader {
   // ---------------------------------------------------------- elements
 
   void ReadModel(const Node& n) {
-    n.ExpectKeys({"properties", "elements", "selection"});
+    n.ExpectKeys({"properties", "elements", "selection", "diagram", "diagramMembers"});
     if (auto p = n.Find("properties")) m_.modelProperties = ReadProperties(*p);
     if (auto e = n.Find("elements")) {
       const std::vector<Node> elements = e->Elements();
@@ -420,6 +420,24 @@ class ModelReader {
         if (!m_.FindElement(item.String())) item.Fail("no element \"" + item.String() + "\" in the model");
         m_.selection.push_back(item.String());
       }
+    m_.diagramMembers = n.BoolOr("diagramMembers", true);
+    if (auto d = n.Find("diagram")) {
+      d->ExpectKeys({"comment", "name", "classes"});
+      DiagramDef diagram;
+      const Node name = d->Member("name");
+      diagram.name = name.String();
+      if (diagram.name.empty()) name.Fail("a diagram needs a name");
+      if (auto c = d->Find("classes"))
+        for (const Node& cls : c->Elements()) {
+          const ElementDef* e = m_.FindElement(cls.String());
+          if (!e) cls.Fail("no element \"" + cls.String() + "\" in the model");
+          if (e->kind != "Class") cls.Fail("\"" + cls.String() + "\" is a " + e->kind + ", not a Class");
+          if (std::find(diagram.classes.begin(), diagram.classes.end(), cls.String()) != diagram.classes.end())
+            cls.Fail("\"" + cls.String() + "\" is on the diagram once already");
+          diagram.classes.push_back(cls.String());
+        }
+      m_.diagram = std::move(diagram);
+    }
   }
 
   // A name that must denote an element of `kind` (any kind when empty).

@@ -120,6 +120,13 @@ struct ElementDef {
   bool navigable = false;
 };
 
+// The class diagram the user works in, as GetActiveDiagram hands it out:
+// its name and the classes it shows, in order.
+struct DiagramDef {
+  std::string name;
+  std::vector<std::string> classes;
+};
+
 // ------------------------------------------------------------------ faults
 // Failures the model injects into the add-in's world, so that every failure
 // path of the add-in can be played. Read from the model's "faults".
@@ -168,6 +175,11 @@ struct ModelDef {
   Properties modelProperties;
   std::vector<ElementDef> elements;  // added through AddElement, which keeps them findable
   std::vector<std::string> selection;
+  std::optional<DiagramDef> diagram;  // none: no class diagram is open
+  // False: the host lacks the members class-diagram expansion uses (the
+  // model's GetActiveDiagram, a class's GetClientClasses and
+  // GetSupplierClasses).
+  bool diagramMembers = true;
   FaultsDef faults;
 
   const ElementDef* FindElement(std::string_view key) const;

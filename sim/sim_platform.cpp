@@ -314,6 +314,17 @@ bool RecordingFileSystem::AppendComposed(std::string_view path, const std::funct
   return ok;
 }
 
+std::string RecordingFileSystem::ReadText(std::string_view path) {
+  try {
+    std::string text = inner_.ReadText(path);
+    log_.Add({{"ev", "file-read"}, {"path", path}, {"ok", true}});
+    return text;
+  } catch (const AutomationError& e) {
+    log_.Add({{"ev", "file-read"}, {"path", path}, {"ok", false}, {"error", ErrorJson(e)}});
+    throw;
+  }
+}
+
 namespace {
 
 // Where the file system's refusal is the sim's failure to change the world.

@@ -166,6 +166,9 @@ class RecordingFileSystem final : public platform::FileSystem {
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
+  // Recorded as "file-read" with the path and whether it opened, not with
+  // the text: the model file already shows what the file holds.
+  std::string ReadText(std::string_view path) override;
 
  private:
   platform::FileSystem& inner_;
@@ -174,7 +177,8 @@ class RecordingFileSystem final : public platform::FileSystem {
 };
 
 // Lays out the model's folders and files before the run. The platform's
-// file interface only appends and deletes, so this is the sim's own door:
+// file interface makes no folders and writes no whole files, so this is the
+// sim's own door:
 // `hostPath` maps a Windows path to where it really lies. Each raises
 // WorldError when the file system refuses.
 class FileSeeder {

@@ -245,10 +245,11 @@ void Simulation::Call(const Action& a) {
   const uint64_t before = log_.hostCalls();
   try {
     const Variant result = api_->Invoke(api_->IdOfName(a.member), a.kind, args);
-    EventJson ev{{"ev", "result"}, {"member", a.member}, {"hostCalls", log_.hostCalls() - before}};
-    ev["value"] = IsCodeIconsMember(a.member) && result.isObject() && !result.isNothing()
-                      ? DescribeCodeIcons(result.toObject())
-                      : log_.Value(result);
+    const bool codeIcons = IsCodeIconsMember(a.member) && result.isObject() && !result.isNothing();
+    EventJson ev{{"ev", "result"},
+                 {"member", a.member},
+                 {"hostCalls", log_.hostCalls() - before},
+                 {"value", codeIcons ? DescribeCodeIcons(result.toObject()) : ResultValue(result)}};
     if (!byRef.empty()) {
       EventJson written = EventJson::object();
       for (size_t i : byRef) written[std::to_string(i + 1)] = log_.Value(slots[i]);
@@ -262,6 +263,27 @@ void Simulation::Call(const Action& a) {
               {"number", e.number()},
               {"description", e.description()},
               {"hostCalls", log_.hostCalls() - before}});
+  }
+}
+
+// The host reads a collection the add-in hands it (the stereotype lists)
+// by Count and Item; the log shows what it reads, {"collection": [items]}.
+// Any other object of the add-in's own shows as it is, {"object": "?"}.
+EventJson Simulation::ResultValue(const Variant& result) {
+  EventJson shown = log_.Value(result);
+  const ObjectPtr object = result.isObject() ? result.deref().objectOrNull() : nullptr;
+  if (!object || log_.Label(object.get()) != "?") return shown;
+  try {
+    const int32_t count = object->Invoke(object->IdOfName("Count"), CallKind::PropertyGet, {}).toInt32();
+    const DispId item = object->IdOfName("Item");
+    EventJson items = EventJson::array();
+    for (int32_t i = 1; i <= count; ++i) {
+      Variant index(i);
+      items.push_back(log_.Value(object->Invoke(item, CallKind::PropertyGet, std::span<Variant>(&index, 1))));
+    }
+    return {{"collection", std::move(items)}};
+  } catch (...) {
+    return shown;
   }
 }
 

@@ -82,6 +82,9 @@ class Simulation {
 
  private:
   void Call(const Action& action);
+  // A member's result as the log shows it; an object the add-in made
+  // itself is shown by its contents where it is a collection.
+  EventJson ResultValue(const Variant& result);
   void SeedRegistry(const std::vector<RegistryEntry>& entries);
   void MakeObject(const Action& action);
   void Use(const Action& action);

@@ -92,6 +92,11 @@ std::string ShortValue(const EventJson& v) {
     if (form == "object") return inner.is_null() ? "Nothing" : inner.get<std::string>();
     if (form == "null") return "Null";
     if (form == "byref") return "byref " + ShortValue(inner);
+    if (form == "collection" && inner.is_array()) {
+      std::string items;
+      for (const EventJson& item : inner) items += (items.empty() ? "" : ", ") + ShortValue(item);
+      return "collection [" + items + "]";
+    }
   }
   // A collection of code icons: "codeicons(2) Class 16x16, Interface 16x16".
   if (v.is_object() && v.value("object", EventJson()) == "codeicons" && v.contains("items")) {
@@ -157,6 +162,9 @@ std::string TranscriptLine(const EventJson& e) {
   if (ev == "file-append")
     return Line("file",
                 "append " + Str(e, "path") + " " + Quoted(Str(e, "text")) + (e.value("ok", false) ? "" : " FAILED"));
+  if (ev == "diagram-add") return Line("diagram", Str(e, "diagram") + " shows " + Str(e, "class"));
+  if (ev == "file-read")
+    return Line("file", "read " + Str(e, "path") + (e.value("ok", false) ? "" : " FAILED " + ErrorText(F(e, "error"))));
   if (ev == "debuglog") return Line("log", Str(e, "line") + (e.value("ok", false) ? "" : "   [not written]"));
   if (ev == "sleep") return Line("sleep", Str(e, "ms") + " ms");
   if (ev == "doevents") return Line("doevents", "");

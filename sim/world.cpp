@@ -26,8 +26,11 @@ World::World(const ModelDef& def, EventLog& log)
     } else if (e.kind == "Association") {
       associationsOf_[e.role1].push_back(i);
       if (e.role2 != e.role1) associationsOf_[e.role2].push_back(i);
+    } else if (e.kind == "Role") {
+      rolesAt_[e.roleClass].push_back(i);
     }
   }
+  if (def.diagram) diagram_ = std::make_shared<DiagramObject>(*this, *def.diagram);
 }
 
 const std::vector<size_t>& World::Listed(const Places& places, std::string_view key) {

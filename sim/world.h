@@ -49,6 +49,10 @@ class World {
   const std::vector<size_t>& RelationsFrom(std::string_view client) const { return Listed(relationsFrom_, client); }
   const std::vector<size_t>& RelationsTo(std::string_view supplier) const { return Listed(relationsTo_, supplier); }
   const std::vector<size_t>& AssociationsOf(std::string_view role) const { return Listed(associationsOf_, role); }
+  // Roles by the class at their end.
+  const std::vector<size_t>& RolesAt(std::string_view cls) const { return Listed(rolesAt_, cls); }
+  // The class diagram the user works in; nullptr when none is open.
+  ObjectPtr diagram() const { return diagram_; }
 
   // The model's selection, as element keys (checked by the caller).
   void Select(std::vector<std::string> keys) { selection_ = std::move(keys); }
@@ -76,7 +80,8 @@ class World {
   std::vector<std::shared_ptr<AddInObject>> addins_;
   std::vector<std::string> selection_;
   std::map<std::string, int> instances_;
-  Places relationsFrom_, relationsTo_, associationsOf_;  // keys are views of def_'s names
+  Places relationsFrom_, relationsTo_, associationsOf_, rolesAt_;  // keys are views of def_'s names
+  ObjectPtr diagram_;
 };
 
 }  // namespace kpx::sim

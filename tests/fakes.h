@@ -53,6 +53,8 @@ class FakeObject : public Object {
     return *this;
   }
 
+  const std::string& label() const { return label_; }
+
   DispId IdOfName(std::string_view name) override {
     for (auto& [id, m] : members_)
       if (EqualsNoCase(m.name, name)) return id;
@@ -117,10 +119,20 @@ class MemoryFiles : public platform::FileSystem {
     files[LCase(path)] += compose();
     return true;
   }
+  // Paths in `folders` are folders: reading one is refused as Windows
+  // refuses it.
+  std::string ReadText(std::string_view path) override {
+    if (journal) journal->push_back("read " + std::string(path));
+    if (folders.count(LCase(path))) throw AutomationError(vberr::kPathFileAccess);
+    auto it = files.find(LCase(path));
+    if (it == files.end()) throw AutomationError(vberr::kFileNotFound);
+    return it->second;
+  }
   std::string& at(std::string_view path) { return files[LCase(path)]; }
 
   std::map<std::string, std::string> files;  // by lower-case path
   std::set<std::string> failing;             // lower-case paths
+  std::set<std::string> folders;             // lower-case paths
   int failNext = 0;                          // appends to refuse, whatever the path
   int appendAttempts = 0;
   Journal* journal = nullptr;

@@ -298,6 +298,7 @@ TEST_F(ApiTest, EveryBuiltMemberBeginsWithItsTraceLine) {
       {"OnModelUpdateSelection", "kpxAddin.OnModelUpdateSelection(QuarnApp)."},
       {"OnClassWizard", "BEGIN kpxAddin:OnClassWizard"},
       {"OnLangProperties", "kpxAddin.OnModelUpdateOptions: Calling kpxLangProps."},
+      {"OnProperties", "kpxAddin.OnProperties(anItem, Optional aContext)"},
       {"OnUser1", "BEGIN kpxAddin.OnUser1"},
       {"OnUser2", "BEGIN kpxAddin.OnUser2"},
       {"OnUser3", "BEGIN kpxAddin.OnUser3"},

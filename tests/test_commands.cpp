@@ -211,6 +211,30 @@ TEST_F(CommandTest, ModelUpdateFallsBackOnlyWhenTheSelectionUpdateIsMissing) {
                    " TRACE    ADDIN     kpxAddin.StartModelUpdate(QuarnApp).\r\n");
 }
 
+TEST_F(CommandTest, AssigningClassesFallsBackToTheAssignmentDialogOnlyWhenTheEventIsMissing) {
+  handler->On(4, "OnComponentAssignment", nullptr);
+  Activate();
+  ObjectPtr a = app;
+  EXPECT_EQ(api->OnAssignClasses(a), 0);
+  EXPECT_EQ(world.journal, (test::Journal{"app.AddInManager", "vc.Name", "vs.Name", "vs.EventHandler",
+                                          "handler.?OnAssignClasses", "handler.OnComponentAssignment <obj>"}));
+
+  handler->On(5, "OnAssignClasses", [](Args) -> Variant { throw AutomationError(5, "no component"); });
+  world.journal.clear();
+  EXPECT_EQ(api->OnAssignClasses(a), 0);
+  EXPECT_EQ(world.journal.back(), "handler.OnAssignClasses <obj>");
+  EXPECT_EQ(Log(), " TRACE    ADDIN     kpxAddin.OnAssignClasses(QuarnApp)\r\n"
+                   " TRACE    ADDIN     kpxAddin.OnAssignClasses(QuarnApp).\r\n"
+                   " TRACE    ADDIN     kpxAddin.OnAssignClasses(QuarnApp)\r\n"
+                   " TRACE    ADDIN     kpxAddin.OnAssignClasses(QuarnApp).\r\n"
+                   " ERROR    ADDIN     kpxAddin.OnAssignClasses(QuarnApp) failed: no component\r\n");
+
+  withSibling = false;
+  world.journal.clear();
+  EXPECT_EQ(api->OnAssignClasses(a), 0);
+  EXPECT_EQ(world.journal, (test::Journal{"app.AddInManager", "vc.Name"}));
+}
+
 TEST_F(CommandTest, ForwardingWithoutTheSiblingWritesOneErrorLineEach) {
   Activate();
   withSibling = false;

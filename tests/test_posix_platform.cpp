@@ -9,6 +9,7 @@
 
 #include <unistd.h>
 
+#include "automation/automation_error.h"
 #include "platform/posix/posix_platform.h"
 #include "platform/posix/regedit_file.h"
 
@@ -382,6 +383,33 @@ TEST(SandboxFileSystem, FailsWhereWindowsFails) {
   EXPECT_TRUE(fs::is_directory(sb / "C" / "folder"));
   EXPECT_TRUE(files.DeleteFile("C:\\new.txt"));
   EXPECT_FALSE(files.DeleteFile("C:\\new.txt"));
+}
+
+// Reading raises what VB's Open raises for the same path on Windows.
+TEST(SandboxFileSystem, ReadsFilesWhole) {
+  TempDir dir;
+  const fs::path& sb = dir.path();
+  SandboxFileSystem files(sb);
+  fs::create_directories(sb / "C" / "Quarn" / "Sub");
+  static const char kText[] = "Item=Class\r\nStereotype=x\0y\n";
+  const std::string text(kText, sizeof kText - 1);
+  WriteFile(sb / "C" / "Quarn" / "vc.cfg", text);
+
+  EXPECT_EQ(files.ReadText("c:\\QUARN\\VC.CFG"), text);
+  auto errorOf = [&](std::string_view path) {
+    try {
+      files.ReadText(path);
+    } catch (const AutomationError& e) {
+      return e.number();
+    }
+    return 0;
+  };
+  EXPECT_EQ(errorOf("C:\\Quarn\\missing.cfg"), vberr::kFileNotFound);
+  EXPECT_EQ(errorOf("C:\\Quarn\\Nowhere\\vc.cfg"), vberr::kPathNotFound);
+  EXPECT_EQ(errorOf("E:\\vc.cfg"), vberr::kPathNotFound) << "a drive that is not there";
+  EXPECT_EQ(errorOf("C:\\Quarn\\Sub"), vberr::kPathFileAccess);
+  EXPECT_EQ(errorOf("C:\\Quarn\\vc.cfg\\more"), vberr::kPathNotFound) << "a file is no folder";
+  EXPECT_EQ(errorOf(""), vberr::kPathNotFound);
 }
 
 TEST(SandboxFileSystem, NamesMadeAfterAFolderIsReadAreFoundInAnyCase) {

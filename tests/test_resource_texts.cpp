@@ -49,7 +49,7 @@ TEST(ResourceTexts, EveryTextIsNonEmptyPrintableAscii) {
 }
 
 TEST(ResourceTexts, EveryIdTheAddInAsksForIsPresent) {
-  std::set<int32_t> wanted = {1132, 1176, 1218, 1219};
+  std::set<int32_t> wanted = {1132, 1176, 1218, 1219, 5080, 5081};
   for (int32_t id = 5001; id <= 5060; ++id) wanted.insert(id);
   for (int32_t id = 30000; id <= 30013; ++id) wanted.insert(id);
   for (int32_t id : wanted) EXPECT_NE(FindResourceText(id), nullptr) << id;

@@ -42,7 +42,8 @@ const char* kWorld = R"({
       {"kind": "Role", "name": "r2", "class": "CCircle"},
       {"kind": "Association", "name": "a", "role1": "r1", "role2": "r2"}
     ],
-    "selection": ["Circle", "IShape"]
+    "selection": ["Circle", "IShape"],
+    "diagram": {"name": "Main", "classes": ["Circle"]}
   }
 })";
 
@@ -252,6 +253,51 @@ TEST_F(SimWorldTest, PropertiesAndNamesChangeAndAreRecorded) {
   EXPECT_EQ("IFigure", writes[3]["value"]);
   // The scenario still knows the element by its original name.
   EXPECT_NE(nullptr, w.world().FindElement("IShape"));
+}
+
+// Expansion's view of the model: a class's suppliers are the classes at the
+// supplier end of its relations and across associations whose far role is
+// navigable; its clients the other way round. Modules and the class itself
+// never count, and each class comes once, in model order.
+TEST_F(SimWorldTest, ClientsAndSuppliersFollowRelationsAndNavigableRoles) {
+  auto labels = [&](const char* cls, const char* member) {
+    ObjectPtr list = CallByName(element(cls), member, CallKind::Method).toObject();
+    std::vector<std::string> out;
+    for (int16_t i = 1; i <= GetProperty(list, id::kCount).toInt16(); ++i)
+      out.push_back(LabelOf(CallMethod(list, id::kGetAt, {Variant(i)})));
+    return out;
+  };
+  using L = std::vector<std::string>;
+  EXPECT_EQ(labels("Circle", "GetSupplierClasses"), L{"element:IShape"});
+  EXPECT_EQ(labels("Circle", "GetClientClasses"), L{"element:CCircle"});
+  EXPECT_EQ(labels("CCircle", "GetSupplierClasses"), L{"element:Circle"});
+  EXPECT_EQ(labels("CCircle", "GetClientClasses"), L{});
+  EXPECT_EQ(labels("IShape", "GetClientClasses"), L{"element:Circle"});
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { CallByName(element("Shapes"), "GetClientClasses", CallKind::Method); }));
+}
+
+TEST_F(SimWorldTest, TheActiveDiagramShowsEachClassOnceAndRecordsWhatIsAdded) {
+  ObjectPtr model = GetObject(app(), id::kCurrentModel);
+  ObjectPtr diagram = CallByName(model, "GetActiveDiagram", CallKind::Method).toObject();
+  ASSERT_EQ("diagram:Main", w.log().Label(diagram.get()));
+  EXPECT_EQ(diagram, CallByName(model, "GetActiveDiagram", CallKind::Method).toObject()) << "one diagram, kept";
+  EXPECT_FALSE(CallByName(diagram, "AddClass", CallKind::Method, {Variant(element("Circle"))}).toBool());
+  EXPECT_TRUE(CallByName(diagram, "AddClass", CallKind::Method, {Variant(element("IShape"))}).toBool());
+  EXPECT_FALSE(CallByName(diagram, "AddClass", CallKind::Method, {Variant(element("IShape"))}).toBool());
+  EXPECT_EQ(vberr::kInvalidCall,
+            ErrorNumberOf([&] { CallByName(diagram, "AddClass", CallKind::Method, {Variant(element("Shapes"))}); }));
+  const std::vector<EventJson> adds = w.Events("diagram-add");
+  ASSERT_EQ(1u, adds.size());
+  EXPECT_EQ("Main", adds[0]["diagram"]);
+  EXPECT_EQ("IShape", adds[0]["class"]);
+
+  SimWorld bare(R"({"model": {"elements": [{"kind": "Class", "name": "A"}], "diagramMembers": false}})");
+  ObjectPtr bareModel = GetObject(bare.world().application(), id::kCurrentModel);
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { bareModel->IdOfName("GetActiveDiagram"); }));
+  EXPECT_EQ(vberr::kNoSuchMember, ErrorNumberOf([&] { bare.world().FindElement("A")->IdOfName("GetSupplierClasses"); }));
+  SimWorld closed(R"({"model": {"elements": [{"kind": "Class", "name": "A"}]}})");
+  EXPECT_TRUE(CallByName(GetObject(closed.world().application(), id::kCurrentModel), "GetActiveDiagram",
+                         CallKind::Method).isNothing());
 }
 
 }  // namespace

@@ -697,6 +697,14 @@ void BridgeAgainstHostObjects() {
     // A foreign object goes back out as its own pointer.
     kpx::CallMethod(object, 10, {kpx::Variant(object)});
     CHECK(host->CallsOf(L"Three").back().args == std::vector<std::wstring>{L"disp"});
+    // Each adoption is a wrapper of its own; the object's IUnknown tells
+    // that two of them are one object, as VB's Is does.
+    kpx::ObjectPtr again = bridge.Adopt(host.get());
+    CHECK(again != object);
+    CHECK(kpx::SameObject(again, object));
+    Ref<HostObject> other = HostObject::Make(L"other");
+    CHECK(!kpx::SameObject(bridge.Adopt(other.get()), object));
+    CHECK(!kpx::SameObject(kpx::ObjectPtr(), object));
     host->Clear();
   }
   CHECK_EQ(locks.objects, 0L);
@@ -872,6 +880,14 @@ void PlatformOverWin32(const Paths& paths, HMODULE addin) {
   CHECK(world.files.AppendText(file, "t\xC3\xA9st\r\n"));
   CHECK(world.files.Exists(file));
   CHECK_EQ(ReadFileBytes(Widen(file)), std::string("one\r\nt\xE9st\r\n"));
+  // Read back whole, from the ANSI code page; what cannot be opened raises
+  // what VB's Open raises.
+  CHECK_EQ(world.files.ReadText(file), std::string("one\r\nt\xC3\xA9st\r\n"));
+  CHECK_EQ(ErrorNumber([&] { world.files.ReadText(Narrow(paths.scratch) + "\\absent.txt"); }),
+           kpx::vberr::kFileNotFound);
+  CHECK_EQ(ErrorNumber([&] { world.files.ReadText(Narrow(paths.scratch) + "\\no such folder\\x.txt"); }),
+           kpx::vberr::kPathNotFound);
+  CHECK_EQ(ErrorNumber([&] { world.files.ReadText(Narrow(paths.scratch)); }), kpx::vberr::kPathFileAccess);
   CHECK(world.files.DeleteFile(file));
   CHECK(!world.files.DeleteFile(file));
   CHECK(!world.files.AppendText(Narrow(paths.scratch) + "\\no such folder\\x.txt", "x"));

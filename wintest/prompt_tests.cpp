@@ -311,6 +311,8 @@ void LayoutAndOwner(HMODULE addin) {
   CHECK(ten.message.bottom - ten.message.top >= 10 * lineHeight);
   CHECK(wrapped.message.bottom - wrapped.message.top >= 5 * lineHeight);
   CHECK(ten.client.bottom > oneLine.client.bottom);
+  // Short lines make a narrow message; a paragraph wraps at a wider one.
+  CHECK(ten.message.right - ten.message.left < wrapped.message.right - wrapped.message.left);
   // The long paragraph wraps: the window stays within a screen's width.
   CHECK(wrapped.window.right - wrapped.window.left < GetSystemMetrics(SM_CXSCREEN));
   for (const Geometry* g : {&oneLine, &ten, &wrapped, &bare}) {

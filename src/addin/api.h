@@ -89,8 +89,9 @@ class API final : public Object {
   int32_t OnModelUpdateSelection(ObjectPtr& QuarnApp);
   int32_t OnComponentAssignment(ObjectPtr& QuarnApp);
 
-  // Companion launchers.
-  ObjectPtr ModelAssistantAPI();
+  // Companion launchers. A model assistant that cannot be made leaves the
+  // creation's error text in `failure`, when given.
+  ObjectPtr ModelAssistantAPI(std::string* failure = nullptr);
   ObjectPtr StatementGenerator();
   ObjectPtr CodeViewProject();
   int32_t OnModelAssistant(ObjectPtr& QuarnApp);
@@ -123,6 +124,18 @@ class API final : public Object {
   // The code icons, small and large: a keyed collection of pictures each.
   ObjectPtr CodeIcons();
   ObjectPtr LargeCodeIcons();
+
+  // The property page of an item, and the stereotype lists the host offers.
+  bool OnProperties(const Variant& anItem, const Variant& aContext);
+  Variant ComponentStereotypes();
+  Variant ClassStereotypes();
+
+  // Components, class assignment, ATL import and drawing.
+  std::string ComponentInfo();
+  int32_t OnNewComponent(ObjectPtr& QuarnApp, ObjectPtr& Component);
+  int32_t OnAssignClasses(ObjectPtr& QuarnApp);
+  int32_t OnImportATL(ObjectPtr& QuarnApp);
+  int32_t RenderClass(ObjectPtr& QuarnApp, ObjectPtr& aClass);
 
   // The user drawing and changing the model.
   void OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
@@ -162,7 +175,16 @@ class API final : public Object {
                           const char* prefix);
   bool CheckComponent(const ObjectPtr& component);
   void SetMenuState(const char* key, bool enabled);
-  void ExpandClassDiagram(const ObjectPtr& QuarnApp, const ObjectPtr& classes, bool clients);
+  // Class-diagram expansion: the classes related to the selected ones are
+  // added to the diagram the user works in.
+  enum class Expansion : uint8_t { Clients, Suppliers, Both };
+  void ExpandClassDiagram(const ObjectPtr& QuarnApp, Expansion which);
+  // The class at the end of the association's other role from `role`.
+  ObjectPtr ClassAcross(const ObjectPtr& role);
+  // A member the host offers by name only, its id looked up once per
+  // activation (every object of one kind answers a name with one id).
+  Variant CallNamed(const ObjectPtr& object, std::string_view name, std::optional<DispId>& id, CallKind kind,
+                    std::initializer_list<Variant> args = {});
   CodeIconsHolder& TheCodeIconsHolder();
 
   Module& module_;
@@ -182,6 +204,8 @@ class API final : public Object {
   // activation serves them all: each look-up is a round trip to the host.
   struct HostNameIds {
     std::optional<DispId> menuState, classKind, kindName;
+    std::optional<DispId> association, role1, role2;
+    std::optional<DispId> activeDiagram, addClass, clientClasses, supplierClasses;
   } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
   std::unique_ptr<CodeIconsHolder> codeIconsHolder_;  // made on first use

@@ -18,14 +18,16 @@ constexpr int32_t kMsgNoClassSelectedTitle = 5056;
 
 }  // namespace
 
-ObjectPtr API::ModelAssistantAPI() {
+ObjectPtr API::ModelAssistantAPI(std::string* failure) {
   TraceEntry("ModelAssistantAPI");
   ResumeNext onError;
   if (!theModelAssistantAPI_) {
     onError([&] { theModelAssistantAPI_ = module_.platform().objects.CreateObject("kpxModelAssist.API"); });
-    if (!theModelAssistantAPI_)
+    if (!theModelAssistantAPI_) {
       module_.DebugLog("kpxAddin.ModelAssistant: CreateObject(kpxModelAssist.API) failed.", logid::ADDIN,
                        loglevel::ERROR);
+      if (failure) *failure = onError.description();
+    }
   }
   return theModelAssistantAPI_;
 }
@@ -151,6 +153,9 @@ Variant API::OnLangProperties(ObjectPtr& QuarnApp, const Variant& lPage) {
         return Variant(false);
       });
 }
+
+// Importing an ATL project into the model is the ATL tools' work too.
+int32_t API::OnImportATL(ObjectPtr& QuarnApp) { return LaunchAtlTool(QuarnApp, "OnImportATL", "OnImportATL"); }
 
 // The ATL tools: one dialog component, one member per command.
 int32_t API::LaunchAtlTool(ObjectPtr& QuarnApp, const char* member, const char* trace) {

@@ -272,13 +272,12 @@ bool API::OnSelectedContextMenuItem(ObjectPtr& QuarnApp, std::string& internalNa
   } else if (is({"CComponent_Assignment"})) {
     OnComponentAssignment(QuarnApp);
   } else if (is({"CClass_ExpandSuppliers"})) {
-    ExpandClassDiagram(QuarnApp, nullptr, false);
+    ExpandClassDiagram(QuarnApp, Expansion::Suppliers);
   } else if (is({"CClass_ExpandClients"})) {
-    ExpandClassDiagram(QuarnApp, nullptr, true);
+    ExpandClassDiagram(QuarnApp, Expansion::Clients);
   } else if (is({"CClass_ExpandBoth"})) {
-    ObjectPtr classes = SelectedItems(QuarnApp);
-    ExpandClassDiagram(QuarnApp, classes, true);
-    ExpandClassDiagram(QuarnApp, classes, false);
+    // One look at the selection and the diagram serves both: clients first.
+    ExpandClassDiagram(QuarnApp, Expansion::Both);
   } else if (is({"CClass_Expand2ATL"})) {
     OnExpand2ATLObject(QuarnApp);
   } else if (is({"CClass_ImplementInterface"})) {
@@ -295,12 +294,6 @@ bool API::OnSelectedContextMenuItem(ObjectPtr& QuarnApp, std::string& internalNa
     DispatchUserCommand(QuarnApp, internalName);
   }
   return false;
-}
-
-// Class-diagram expansion draws the related classes into the diagram; the
-// host offers the add-in no way to place classes on a diagram yet.
-void API::ExpandClassDiagram(const ObjectPtr&, const ObjectPtr&, bool clients) {
-  RaiseNotImplemented(clients ? "Expand clients" : "Expand suppliers");
 }
 
 }  // namespace kpx

@@ -57,6 +57,36 @@ int32_t API::OnModelUpdateSelection(ObjectPtr& QuarnApp) {
   return 0;
 }
 
+// Assigning classes to components is the sibling's component assignment. A
+// sibling without an event of this name is shown its assignment dialog,
+// where the user assigns the classes just the same.
+int32_t API::OnAssignClasses(ObjectPtr& QuarnApp) {
+  TraceEntry("OnAssignClasses");
+  return CatchAll(
+      [&] {
+        ObjectPtr addIn = FindAddIn(QuarnApp, "VisualStudio");
+        if (!addIn) {
+          module_.DebugLog("kpxAddin.OnAssignClasses(QuarnApp) failed to get VisualStudio addin.", logid::ADDIN,
+                           loglevel::ERROR);
+          return 0;
+        }
+        module_.DebugLog("kpxAddin.OnAssignClasses(QuarnApp).", logid::ADDIN, loglevel::TRACE);
+        const ObjectPtr handler = CallByName(addIn, hostid::kEventHandler, CallKind::PropertyGet).toObject();
+        ResumeNext onError;
+        onError([&] { CallWithApp(handler, "OnAssignClasses", QuarnApp); });
+        if (onError.number() == vberr::kNoSuchMember)
+          CallWithApp(handler, "OnComponentAssignment", QuarnApp);
+        else if (onError.failed())
+          throw AutomationError(onError.number(), onError.description());
+        return 0;
+      },
+      [&](const AutomationError& e) {
+        module_.DebugLog("kpxAddin.OnAssignClasses(QuarnApp) failed: " + e.description(), logid::ADDIN,
+                         loglevel::ERROR);
+        return 0;
+      });
+}
+
 void API::StartModelUpdate(ObjectPtr& QuarnApp, bool selectionOnly) {
   CatchAll(
       [&] {

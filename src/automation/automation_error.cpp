@@ -11,6 +11,7 @@ std::string VbErrorDescription(int32_t number) {
     case vberr::kInternal: return "Internal error";
     case vberr::kFileNotFound: return "File not found";
     case vberr::kPathFileAccess: return "Path/File access error";
+    case vberr::kPathNotFound: return "Path not found";
     case vberr::kObjectNotSet: return "Object variable or With block variable not set";
     case vberr::kInvalidUseOfNull: return "Invalid use of Null";
     case vberr::kCantCreateObject: return "ActiveX component can't create object";

@@ -16,6 +16,7 @@ inline constexpr int32_t kTypeMismatch = 13;        // Type mismatch
 inline constexpr int32_t kInternal = 51;            // Internal error
 inline constexpr int32_t kFileNotFound = 53;        // File not found
 inline constexpr int32_t kPathFileAccess = 75;      // Path/File access error
+inline constexpr int32_t kPathNotFound = 76;        // Path not found
 inline constexpr int32_t kObjectNotSet = 91;        // Object variable or With block variable not set
 inline constexpr int32_t kInvalidUseOfNull = 94;    // Invalid use of Null
 inline constexpr int32_t kCantCreateObject = 429;   // ActiveX component can't create object

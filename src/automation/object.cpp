@@ -8,6 +8,11 @@ DispId Object::IdOfOwnOperation(int) { throw AutomationError(vberr::kNoSuchMembe
 
 ObjectPtr Object::QueryInterface(std::string_view) { throw AutomationError(vberr::kTypeMismatch); }
 
+bool SameObject(const ObjectPtr& a, const ObjectPtr& b) {
+  if (!a || !b) return !a && !b;
+  return a == b || a->Identity() == b->Identity();
+}
+
 Variant Invoke(const ObjectPtr& obj, DispId id, CallKind kind, std::span<Variant> args) {
   if (!obj) throw AutomationError(vberr::kObjectNotSet);
   return obj->Invoke(id, kind, args);

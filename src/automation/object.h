@@ -45,7 +45,17 @@ class Object {
 
   // Calls a member. For a property put, the value is the last argument.
   virtual Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) = 0;
+
+  // What tells one object from another, as VB's `Is` does: the object
+  // itself by default. A wrapper of an object reached through COM answers
+  // the object's IUnknown, the one pointer COM keeps for an object however
+  // often and through whichever interface it is handed out, so two wrappers
+  // of one host object are the same object.
+  virtual const void* Identity() { return this; }
 };
+
+// VB's `a Is b`: both Nothing, or the same object (by Identity()).
+bool SameObject(const ObjectPtr& a, const ObjectPtr& b);
 
 // Late-bound calls. All raise 91 on Nothing.
 Variant Invoke(const ObjectPtr& obj, DispId id, CallKind kind, std::span<Variant> args);

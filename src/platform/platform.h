@@ -74,6 +74,13 @@ class FileSystem {
   bool AppendText(std::string_view path, std::string_view text) {
     return AppendComposed(path, [text] { return std::string(text); });
   }
+  // Reads a whole text file, as VB's Open ... For Input reads one: the
+  // bytes in the system code page, returned as UTF-8, line breaks as they
+  // stand. Raises what Open raises: 53 (File not found) when the folder has
+  // no such file, 76 (Path not found) when a folder on the way is missing,
+  // 75 (Path/File access error) when the path names a folder or the file
+  // cannot be opened or read.
+  virtual std::string ReadText(std::string_view path) = 0;
 };
 
 // ------------------------------------------------------------------- clock

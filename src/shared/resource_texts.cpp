@@ -7,7 +7,7 @@ namespace kpx {
 namespace {
 
 // Ordered by id; FindResourceText searches it by halves.
-constexpr std::array<ResourceText, 78> kTexts = {{
+constexpr std::array<ResourceText, 80> kTexts = {{
     // model events, coclass changed: host log line for each rewritten
     // CComCoClass base, the 1176 part (old base name) followed by this one
     // (old name, new name)
@@ -144,6 +144,13 @@ constexpr std::array<ResourceText, 78> kTexts = {{
      "The coclass has changed. The CComCoClass base of each of its ATL object classes will be "
      "updated to name the coclass's CLSID. Click Cancel to leave them unchanged."},
     {5060, "Coclass Modified"},
+
+    // class-diagram expansion, host log: the host cannot add classes to a
+    // diagram; no class diagram is open
+    {5080,
+     "The class diagram cannot be expanded: this version of the modelling host does not let add-ins add "
+     "classes to a diagram."},
+    {5081, "No class diagram is open: open the diagram to expand it with the related classes."},
 
     // dialog buttons shared by the restore and prompt dialogs
     {30000, "Help"},

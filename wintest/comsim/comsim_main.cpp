@@ -156,8 +156,8 @@ std::string MakeRegistryFaults(const ModelDef& model, const Scenario& scenario) 
 
 bool PlatformEvent(const std::string& ev) {
   static const std::set<std::string> kinds = {"registry-read", "registry-write", "registry-create", "file-exists",
-                                              "file-delete",   "file-append",    "sleep",           "doevents",
-                                              "help",          "debuglog"};
+                                              "file-delete",   "file-append",    "file-read",       "sleep",
+                                              "doevents",      "help",           "debuglog"};
   return kinds.count(ev) != 0;
 }
 

@@ -10,6 +10,8 @@
 #include <thread>
 #include <vector>
 
+#include "automation/automation_error.h"
+
 namespace kpx::posix {
 
 namespace fs = std::filesystem;
@@ -295,6 +297,24 @@ bool SandboxFileSystem::AppendComposed(std::string_view path, const std::functio
   out.write(text.data(), static_cast<std::streamsize>(text.size()));
   out.close();
   return static_cast<bool>(out);
+}
+
+std::string SandboxFileSystem::ReadText(std::string_view path) {
+  path = Win32Path(path);
+  if (path.empty()) throw AutomationError(vberr::kPathNotFound);
+  const fs::path host = HostPath(path);
+  std::error_code ec;
+  // The order in which Windows finds fault with a path: a folder cannot be
+  // opened as a file, a missing folder is a missing path, and only then is
+  // the file itself missing.
+  if (fs::is_directory(host, ec)) throw AutomationError(vberr::kPathFileAccess);
+  if (!fs::is_directory(host.parent_path(), ec)) throw AutomationError(vberr::kPathNotFound);
+  if (!fs::exists(host, ec)) throw AutomationError(vberr::kFileNotFound);
+  std::ifstream in(host, std::ios::binary);
+  if (!in) throw AutomationError(vberr::kPathFileAccess);
+  std::string text((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+  if (in.bad()) throw AutomationError(vberr::kPathFileAccess);
+  return text;
 }
 
 // ------------------------------------------------------------------- clock

@@ -64,6 +64,8 @@ class SandboxFileSystem final : public platform::FileSystem {
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
+  // The native code page is UTF-8: the bytes come back as they are.
+  std::string ReadText(std::string_view path) override;
 
   std::filesystem::path HostPath(std::string_view windowsPath) const;
   const std::filesystem::path& sandbox() const { return sandbox_; }

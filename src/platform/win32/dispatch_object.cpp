@@ -51,7 +51,22 @@ DispatchObject::DispatchObject(ComBridge& bridge, IDispatch* dispatch) : bridge_
   dispatch_->AddRef();
 }
 
-DispatchObject::~DispatchObject() { dispatch_->Release(); }
+DispatchObject::~DispatchObject() {
+  if (identity_) identity_->Release();
+  dispatch_->Release();
+}
+
+const void* DispatchObject::Identity() {
+  if (!identity_) {
+    IUnknown* unknown = nullptr;
+    // Every COM object answers IUnknown; one that does not is told apart
+    // by the pointer it was handed out as.
+    if (FAILED(dispatch_->QueryInterface(IID_IUnknown, reinterpret_cast<void**>(&unknown))) || !unknown)
+      return dispatch_;
+    identity_ = unknown;
+  }
+  return identity_;
+}
 
 DispId DispatchObject::IdOfName(std::string_view name) {
   std::wstring wide = Utf8ToWide(name);

@@ -33,6 +33,10 @@ class DispatchObject : public Object {
   // QueryInterface for the interface; the result finds names in that
   // interface's own type information.
   ObjectPtr QueryInterface(std::string_view iid) override;
+  // The object's IUnknown, asked for once and held while this wrapper
+  // lives: a host hands out a new IDispatch wrapper for every call that
+  // returns an object, but its IUnknown stays the same.
+  const void* Identity() override;
 
   IDispatch* dispatch() const { return dispatch_; }
 
@@ -41,6 +45,7 @@ class DispatchObject : public Object {
 
  private:
   IDispatch* dispatch_;
+  IUnknown* identity_ = nullptr;
 };
 
 // One interface of an object, reached by QueryInterface: names are looked up

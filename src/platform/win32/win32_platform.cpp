@@ -94,6 +94,29 @@ bool Win32FileSystem::AppendComposed(std::string_view path, const std::function<
   return ok && closed && written == ansi.size();
 }
 
+std::string Win32FileSystem::ReadText(std::string_view path) {
+  // Others may have the file open, even for writing, as an editor does.
+  HANDLE file = CreateFileA(Utf8ToAnsi(path).c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr,
+                            OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr);
+  if (file == INVALID_HANDLE_VALUE) {
+    // What VB's Open raises for each: a folder, a locked file and the like
+    // are all "Path/File access error".
+    switch (GetLastError()) {
+      case ERROR_FILE_NOT_FOUND: throw AutomationError(vberr::kFileNotFound);
+      case ERROR_PATH_NOT_FOUND: throw AutomationError(vberr::kPathNotFound);
+      default: throw AutomationError(vberr::kPathFileAccess);
+    }
+  }
+  std::string ansi;
+  char buffer[16384];
+  DWORD got = 0;
+  BOOL ok = TRUE;
+  while ((ok = ReadFile(file, buffer, sizeof buffer, &got, nullptr)) && got > 0) ansi.append(buffer, got);
+  CloseHandle(file);
+  if (!ok) throw AutomationError(vberr::kPathFileAccess);
+  return AnsiToUtf8(ansi);
+}
+
 // ------------------------------------------------------------------- clock
 
 float Win32Clock::Timer() {

@@ -26,6 +26,7 @@ class Win32FileSystem final : public platform::FileSystem {
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
+  std::string ReadText(std::string_view path) override;
 };
 
 class Win32Clock final : public platform::Clock {
