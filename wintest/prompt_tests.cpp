@@ -29,15 +29,6 @@ using kpx::platform::PromptIcon;
 using kpx::platform::PromptOutcome;
 using kpx::platform::PromptView;
 
-// The real user interface over a module's resources, with the bridge the
-// pictures it hands out go through.
-struct RealUi {
-  explicit RealUi(HMODULE resources) : bridge(locks), ui(bridge, resources) {}
-  kpx::win32::ServerLocks locks;
-  kpx::win32::ComBridge bridge;
-  kpx::win32::Win32UserInterface ui;
-};
-
 // The user at the next prompt, on a thread of its own while the test's
 // thread shows the prompt: waits for the window, plays on it, and presses
 // Cancel if the play left it open, so that a failing test cannot hang the
@@ -134,8 +125,9 @@ bool Inside(const RECT& inner, const RECT& outer) {
 
 void TextsIconsAndHelp(HMODULE addin) {
   Group("the prompt window shows the view's texts, the one icon of its kind, and Help enabled only when available");
-  RealUi real(addin);
-  kpx::win32::Win32UserInterface& ui = real.ui;
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   const struct {
     PromptIcon icon;
     bool help;
@@ -171,8 +163,9 @@ void TextsIconsAndHelp(HMODULE addin) {
 
 void ButtonsAndBox(HMODULE addin) {
   Group("Help opens the topic with the prompt's own window, which stays open; the tick, Cancel and the close box come back");
-  RealUi real(addin);
-  kpx::win32::Win32UserInterface& ui = real.ui;
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   {
     HelpRecorder help;
     bool openAfterHelp = false;
@@ -247,8 +240,9 @@ void ButtonsAndBox(HMODULE addin) {
   }
   {
     // Without the module that holds the template there is no window.
-    RealUi noModule(nullptr);
-    kpx::win32::Win32UserInterface& without = noModule.ui;
+    kpx::win32::ServerLocks locks;
+    kpx::win32::ComBridge bridge(locks);
+    kpx::win32::Win32UserInterface without(bridge);
     HelpRecorder help;
     int32_t number = 0;
     try {
@@ -286,8 +280,9 @@ Geometry GeometryOf(HWND prompt, PromptIcon icon) {
 
 void LayoutAndOwner(HMODULE addin) {
   Group("the prompt grows with its message, keeps its controls apart and inside, and opens over the active window");
-  RealUi real(addin);
-  kpx::win32::Win32UserInterface& ui = real.ui;
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   HelpRecorder help;
   PromptOutcome outcome;
 

@@ -121,10 +121,6 @@ class API final : public Object {
   int32_t LanguageId();
   std::string GetLocation(const std::string& path, bool useDefault);
 
-  // The code icons, small and large: a keyed collection of pictures each.
-  ObjectPtr CodeIcons();
-  ObjectPtr LargeCodeIcons();
-
   // The property page of an item, and the stereotype lists the host offers.
   bool OnProperties(const Variant& anItem, const Variant& aContext);
   Variant ComponentStereotypes();
@@ -136,6 +132,10 @@ class API final : public Object {
   int32_t OnAssignClasses(ObjectPtr& QuarnApp);
   int32_t OnImportATL(ObjectPtr& QuarnApp);
   int32_t RenderClass(ObjectPtr& QuarnApp, ObjectPtr& aClass);
+
+  // The code icons, small and large: a keyed collection of pictures each.
+  ObjectPtr CodeIcons();
+  ObjectPtr LargeCodeIcons();
 
   // The user drawing and changing the model.
   void OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
