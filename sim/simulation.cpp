@@ -245,18 +245,10 @@ void Simulation::Call(const Action& a) {
   const uint64_t before = log_.hostCalls();
   try {
     const Variant result = api_->Invoke(api_->IdOfName(a.member), a.kind, args);
-<<<<<<< HEAD
-    const bool codeIcons = IsCodeIconsMember(a.member) && result.isObject() && !result.isNothing();
-    EventJson ev{{"ev", "result"},
-                 {"member", a.member},
-                 {"hostCalls", log_.hostCalls() - before},
-                 {"value", codeIcons ? DescribeCodeIcons(result.toObject()) : ResultValue(result)}};
-=======
     EventJson ev{{"ev", "result"}, {"member", a.member}, {"hostCalls", log_.hostCalls() - before}};
     ev["value"] = IsCodeIconsMember(a.member) && result.isObject() && !result.isNothing()
                       ? DescribeCodeIcons(result.toObject())
                       : ResultValue(result);
->>>>>>> main
     if (!byRef.empty()) {
       EventJson written = EventJson::object();
       for (size_t i : byRef) written[std::to_string(i + 1)] = log_.Value(slots[i]);
