@@ -7,6 +7,7 @@
 #include <stdexcept>
 
 #include "automation/vb_strings.h"
+#include "dialogs/code_icons.h"
 #include "sim/faults.h"
 
 namespace kpx::sim {
@@ -146,6 +147,42 @@ bool SimUserInterface::WinHelp(int64_t window, std::string_view helpFile, uint32
 }
 
 void SimUserInterface::DoEvents() { log_.Add({{"ev", "doevents"}}); }
+
+ObjectPtr SimUserInterface::LoadIconPicture(int32_t resourceId, int32_t pixels) {
+  for (const CodeIconArt& art : CodeIconArtwork())
+    if (art.smallResource == resourceId || art.largeResource == resourceId)
+      return std::make_shared<SimPicture>(resourceId, pixels);
+  throw AutomationError(326, "Resource with identifier '" + std::to_string(resourceId) + "' not found");
+}
+
+std::string SimPicture::label() const {
+  return "icon:" + std::to_string(resourceId_) + "/" + std::to_string(pixels_);
+}
+
+DispId SimPicture::IdOfName(std::string_view name) {
+  static constexpr std::pair<const char*, DispId> kNames[] = {{"Handle", platform::kPictureHandle},
+                                                              {"hPal", platform::kPicturePalette},
+                                                              {"Type", platform::kPictureType},
+                                                              {"Width", platform::kPictureWidth},
+                                                              {"Height", platform::kPictureHeight}};
+  for (const auto& [n, id] : kNames)
+    if (EqualsNoCase(n, name)) return id;
+  throw AutomationError(vberr::kNoSuchMember);
+}
+
+Variant SimPicture::Invoke(DispId id, CallKind kind, std::span<Variant> args) {
+  // The picture's properties are read-only here, as an icon's are.
+  if (kind == CallKind::PropertyPut || kind == CallKind::PropertyPutRef) throw AutomationError(vberr::kNoSuchMember);
+  if (!args.empty()) throw AutomationError(vberr::kWrongArgCount);
+  switch (id) {
+    case platform::kPictureHandle: return resourceId_;
+    case platform::kPicturePalette: return int32_t{0};  // an icon has none
+    case platform::kPictureType: return platform::kPictureTypeIcon;
+    case platform::kPictureWidth:
+    case platform::kPictureHeight: return platform::PixelsToHimetric(pixels_);
+    default: throw AutomationError(vberr::kNoSuchMember);
+  }
+}
 
 // ---------------------------------------------------------------- registry
 

@@ -56,8 +56,27 @@ class RecordingClock final : public platform::Clock {
 
 // ----------------------------------------------------------- user interface
 
+// One of the add-in's icons as the sim hands it out: the standard picture's
+// members (Handle, hPal, Type, Width, Height), its size in HIMETRIC as a 96
+// dpi screen gives it, its Handle the icon's resource id.
+class SimPicture final : public SimObject {
+ public:
+  SimPicture(int32_t resourceId, int32_t pixels) : resourceId_(resourceId), pixels_(pixels) {}
+  std::string label() const override;
+  DispId IdOfName(std::string_view name) override;
+  Variant Invoke(DispId id, CallKind kind, std::span<Variant> args) override;
+
+  int32_t resourceId() const { return resourceId_; }
+  int32_t pixels() const { return pixels_; }
+
+ private:
+  int32_t resourceId_;
+  int32_t pixels_;
+};
+
 // Plays the user: message boxes take the answers the scenario queued, OK
-// otherwise. There is no real user to wrap, so it records itself.
+// otherwise. There is no real user to wrap, so it records itself. Its
+// icons are the add-in's code icons, the resources the DLL carries.
 class SimUserInterface final : public platform::UserInterface {
  public:
   explicit SimUserInterface(EventLog& log) : log_(log) {}
@@ -77,6 +96,7 @@ class SimUserInterface final : public platform::UserInterface {
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
+  ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override;
 
  private:
   EventLog& log_;

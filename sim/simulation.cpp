@@ -4,9 +4,59 @@
 
 #include "automation/dictionary.h"
 #include "automation/error_styles.h"
+#include "automation/vb_strings.h"
+#include "dialogs/code_icons.h"
 #include "shared/token_scanner_object.h"
 
 namespace kpx::sim {
+
+namespace {
+
+bool IsCodeIconsMember(std::string_view member) {
+  return EqualsNoCase(member, "CodeIcons") || EqualsNoCase(member, "LargeCodeIcons");
+}
+
+// A collection of code icons as the log shows it, read through automation
+// alone, so that the add-in's collection of the sim's pictures and the
+// DLL's collection of real pictures read the same: its Count, then each
+// item in order with its picture's type and size in pixels, and the key it
+// is found under. Keys cannot be read from a collection, so each key of the
+// add-in's artwork is looked up and its picture matched to an item by its
+// Handle; an item no such key finds has key null, and the keys that find
+// nothing are listed as "missing".
+EventJson DescribeCodeIcons(const ObjectPtr& icons) {
+  EventJson out{{"object", "codeicons"}};
+  try {
+    std::map<int32_t, std::string> keyOfHandle;
+    EventJson missing = EventJson::array();
+    for (const CodeIconArt& art : CodeIconArtwork()) {
+      try {
+        ObjectPtr picture = CallByName(icons, "Item", CallKind::Method, {Variant(art.key)}).toObject();
+        keyOfHandle[GetProperty(picture, platform::kPictureHandle).toInt32()] = art.key;
+      } catch (...) {
+        missing.push_back(art.key);
+      }
+    }
+    const int32_t count = CallByName(icons, "Count", CallKind::PropertyGet).toInt32();
+    out["count"] = count;
+    EventJson items = EventJson::array();
+    for (int32_t i = 1; i <= count; ++i) {
+      ObjectPtr picture = CallByName(icons, "Item", CallKind::Method, {Variant(i)}).toObject();
+      auto key = keyOfHandle.find(GetProperty(picture, platform::kPictureHandle).toInt32());
+      items.push_back({{"key", key == keyOfHandle.end() ? EventJson() : EventJson(key->second)},
+                       {"type", GetProperty(picture, platform::kPictureType).toInt32()},
+                       {"width", platform::HimetricToPixels(GetProperty(picture, platform::kPictureWidth).toInt32())},
+                       {"height", platform::HimetricToPixels(GetProperty(picture, platform::kPictureHeight).toInt32())}});
+    }
+    out["items"] = std::move(items);
+    if (!missing.empty()) out["missing"] = std::move(missing);
+  } catch (...) {
+    out["error"] = ErrorJson(CurrentError());
+  }
+  return out;
+}
+
+}  // namespace
 
 Simulation::Simulation(const ModelDef& model, Environment environment, AddInFactory makeAddIn,
                        ScenarioObjectFactories makeObjects)
@@ -195,10 +245,10 @@ void Simulation::Call(const Action& a) {
   const uint64_t before = log_.hostCalls();
   try {
     const Variant result = api_->Invoke(api_->IdOfName(a.member), a.kind, args);
-    EventJson ev{{"ev", "result"},
-                 {"member", a.member},
-                 {"hostCalls", log_.hostCalls() - before},
-                 {"value", ResultValue(result)}};
+    EventJson ev{{"ev", "result"}, {"member", a.member}, {"hostCalls", log_.hostCalls() - before}};
+    ev["value"] = IsCodeIconsMember(a.member) && result.isObject() && !result.isNothing()
+                      ? DescribeCodeIcons(result.toObject())
+                      : ResultValue(result);
     if (!byRef.empty()) {
       EventJson written = EventJson::object();
       for (size_t i : byRef) written[std::to_string(i + 1)] = log_.Value(slots[i]);

@@ -98,6 +98,19 @@ std::string ShortValue(const EventJson& v) {
       return "collection [" + items + "]";
     }
   }
+  // A collection of code icons: "codeicons(2) Class 16x16, Interface 16x16".
+  if (v.is_object() && v.value("object", EventJson()) == "codeicons" && v.contains("items")) {
+    std::string text = "codeicons(" + F(v, "count").dump() + ")";
+    const char* separator = " ";
+    for (const EventJson& item : F(v, "items")) {
+      const EventJson& key = F(item, "key");
+      text += separator + (key.is_string() ? key.get<std::string>() : std::string("?")) + " " +
+              F(item, "width").dump() + "x" + F(item, "height").dump();
+      separator = ", ";
+    }
+    if (v.contains("missing")) text += "; missing " + F(v, "missing").dump();
+    return text;
+  }
   return v.dump();
 }
 

@@ -177,6 +177,19 @@ class FakeUi : public platform::UserInterface {
     promptAnswers.erase(promptAnswers.begin());
     return o;
   }
+  // Icons are FakeObjects labelled "icon:<id>/<pixels>"; ids in
+  // `missingIcons` raise 326.
+  ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override {
+    iconLoads.push_back({resourceId, pixels});
+    if (missingIcons.count(resourceId)) throw AutomationError(326);
+    auto picture = std::make_shared<FakeObject>("icon:" + std::to_string(resourceId) + "/" + std::to_string(pixels),
+                                                nullptr);
+    pictures[resourceId] = picture;
+    return picture;
+  }
+  std::vector<std::pair<int32_t, int32_t>> iconLoads;  // resource id, pixels
+  std::set<int32_t> missingIcons;
+  std::map<int32_t, ObjectPtr> pictures;  // the last made of each id
   std::vector<platform::PromptView> prompts;
   std::vector<platform::PromptOutcome> promptAnswers;
   bool pressHelp = false;

@@ -12,8 +12,11 @@
 
 #include <cstdio>
 #include <cstring>
+#include <set>
+#include <span>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "api_h.h"
 #include "kpxres_h.h"
@@ -23,14 +26,17 @@
 #include "automation/object.h"
 #include "calls.h"
 #include "check.h"
+#include "dialogs/code_icons.h"
 #include "host_object.h"
 #include "prompt_tests.h"
 #include "platform/win32/com_bridge.h"
 #include "platform/win32/dispatch_object.h"
+#include "platform/win32/object_dispatch.h"
 #include "platform/win32/win32_platform.h"
 #include "platform/win32/win32_strings.h"
 #include "shared/resource_strings.h"
 #include "shared/resource_texts.h"
+#include "render.h"
 #include "shared/shared_registryapi2.h"
 #include "system.h"
 
@@ -767,12 +773,26 @@ void ObservedServing() {
   CHECK_EQ(locks.objects, 0L);
 }
 
-void PlatformOverWin32(const Paths& paths) {
-  Group("the Win32 platform: resource component early- and late-bound, object creation, registry, files");
+void PlatformOverWin32(const Paths& paths, HMODULE addin) {
+  Group("the Win32 platform: resource component early- and late-bound, object creation, registry, files, icons");
   kpx::win32::ServerLocks locks;
   kpx::win32::ComBridge bridge(locks);
-  kpx::win32::Win32Platform win32(bridge);
+  kpx::win32::Win32Platform win32(bridge, addin);
   kpx::platform::Platform world = win32.platform();
+
+  // Icons from the add-in's module, as pictures wrapped for the core.
+  for (const kpx::CodeIconArt& art : kpx::CodeIconArtwork()) {
+    kpx::ObjectPtr icon = world.ui.LoadIconPicture(art.largeResource, kpx::kLargeCodeIconPixels);
+    CHECK(dynamic_cast<kpx::win32::DispatchObject*>(icon.get()) != nullptr);
+    CHECK_EQ(kpx::GetProperty(icon, kpx::platform::kPictureType).toInt32(), int32_t{kpx::platform::kPictureTypeIcon});
+    CHECK_EQ(kpx::platform::HimetricToPixels(kpx::GetProperty(icon, kpx::platform::kPictureHeight).toInt32()),
+             kpx::kLargeCodeIconPixels);
+  }
+  std::string iconError;
+  CHECK_EQ(ErrorNumber([&] { world.ui.LoadIconPicture(999, 16); }, &iconError), 326);
+  CHECK_EQ(iconError, std::string("Resource with identifier '999' not found"));
+  kpx::win32::Win32Platform program(bridge);  // the test host has no icons of its own
+  CHECK_EQ(ErrorNumber([&] { program.platform().ui.LoadIconPicture(101, 16); }), 326);
 
   kpx::ObjectPtr resource = world.objects.CreateInstance(kpx::kResourceClassId, kpx::kResourceInterfaceId);
   CHECK(dynamic_cast<kpx::win32::EarlyBoundResourceObject*>(resource.get()) != nullptr);
@@ -877,6 +897,131 @@ void PlatformOverWin32(const Paths& paths) {
   CHECK(world.clock.Now().year >= 2000);
 }
 
+
+// ----------------------------------------------------------------- code icons
+
+// An item of a code-icon collection: the picture, or null (the failure
+// checked).
+Ref<IPicture> PictureOf(const Outcome& item) {
+  Ref<IPicture> picture;
+  if (!CHECK_HR(item.hr, S_OK) || !CHECK_EQ(item.result.v.vt, VT_DISPATCH) || !item.result.v.pdispVal) return picture;
+  CHECK_HR(item.result.v.pdispVal->QueryInterface(IID_IPicture, reinterpret_cast<void**>(picture.out())), S_OK);
+  return picture;
+}
+
+void CodeIcons() {
+  Group("CodeIcons and LargeCodeIcons: real icon pictures under every key, walked with For Each");
+  Ref<IDispatch> api = Create(L"kpxAddIn.API");
+  CHECK(api);
+  if (!api) return;
+  const std::span<const kpx::CodeIconArt> artwork = kpx::CodeIconArtwork();
+  const long expected = static_cast<long>(artwork.size());
+  for (const bool large : {false, true}) {
+    const int pixels = large ? kpx::kLargeCodeIconPixels : kpx::kSmallCodeIconPixels;
+    Outcome got = Call(api.get(), IdOf(api.get(), large ? L"LargeCodeIcons" : L"CodeIcons"), Flags::Get);
+    CHECK_HR(got.hr, S_OK);
+    if (!CHECK_EQ(got.result.v.vt, VT_DISPATCH) || !got.result.v.pdispVal) continue;
+    IDispatch* icons = got.result.v.pdispVal;
+    Outcome count = Call(icons, IdOf(icons, L"Count"), Flags::Get);
+    CHECK(count.result.v.vt == VT_I4 && count.result.v.lVal == expected);
+
+    std::vector<IUnknown*> byKey;  // identities, in artwork order
+    bool rendered = false;
+    for (const kpx::CodeIconArt& art : artwork) {
+      Var key = Var::Str(Widen(art.key).c_str());
+      Outcome item = Call(icons, DISPID_VALUE, Flags::MethodOrGet, {&key});
+      Ref<IPicture> picture = PictureOf(item);
+      if (!picture) {
+        std::printf("  no picture under \"%s\"\n", art.key);
+        continue;
+      }
+      // The real picture, handed on as itself: not one of the bridge's own
+      // servers wrapped around it.
+      Ref<IUnknown> ours;
+      CHECK_HR(item.result.v.pdispVal->QueryInterface(kpx::win32::IID_IKpxExposedObject,
+                                                      reinterpret_cast<void**>(ours.out())),
+               E_NOINTERFACE);
+      byKey.push_back(Identity(picture.get()));
+      SHORT type = 0;
+      CHECK_HR(picture->get_Type(&type), S_OK);
+      CHECK_EQ(type, static_cast<SHORT>(PICTYPE_ICON));
+      OLE_XSIZE_HIMETRIC width = 0;
+      OLE_YSIZE_HIMETRIC height = 0;
+      picture->get_Width(&width);
+      picture->get_Height(&height);
+      CHECK_EQ(MulDiv(width, 96, 2540), pixels);
+      CHECK_EQ(MulDiv(height, 96, 2540), pixels);
+      // A late-bound host reads the same through the picture's IDispatch.
+      Outcome lateWidth = Call(item.result.v.pdispVal, DISPID_PICT_WIDTH, Flags::Get);
+      CHECK(lateWidth.result.v.vt == VT_I4 && lateWidth.result.v.lVal == width);
+      OLE_HANDLE handle = 0;
+      CHECK(SUCCEEDED(picture->get_Handle(&handle)) && handle != 0);
+      if (!rendered) {
+        rendered = true;
+        const int inked = InkedPixelsAfterRender(picture.get(), pixels);
+        CHECK(inked > pixels * pixels / 8);
+        std::printf("  %s %dx%d drew %d of %d pixels\n", art.key, pixels, pixels, inked, pixels * pixels);
+      }
+    }
+    CHECK_EQ(static_cast<long>(std::set<IUnknown*>(byKey.begin(), byKey.end()).size()), expected);
+    // By position the same pictures, in the artwork's order.
+    Var first = Var::I4(1), last = Var::I4(expected);
+    Ref<IPicture> firstPicture = PictureOf(Call(icons, DISPID_VALUE, Flags::MethodOrGet, {&first}));
+    Ref<IPicture> lastPicture = PictureOf(Call(icons, DISPID_VALUE, Flags::MethodOrGet, {&last}));
+    if (firstPicture && lastPicture && !byKey.empty()) {
+      CHECK(Identity(firstPicture.get()) == byKey.front());
+      CHECK(Identity(lastPicture.get()) == byKey.back());
+    }
+    Var unknown = Var::Str(L"NoSuchKind");
+    Outcome missing = Call(icons, DISPID_VALUE, Flags::MethodOrGet, {&unknown});
+    CHECK_HR(missing.hr, DISP_E_EXCEPTION);
+    CHECK_HR(missing.info.scode, VbError(5));
+
+    // For Each: _NewEnum answers an IEnumVARIANT over the same pictures.
+    Outcome newEnum = Call(icons, DISPID_NEWENUM, Flags::MethodOrGet);
+    CHECK_HR(newEnum.hr, S_OK);
+    Ref<IEnumVARIANT> walk;
+    if (!CHECK(newEnum.result.v.vt == VT_UNKNOWN && newEnum.result.v.punkVal)) continue;
+    CHECK_HR(newEnum.result.v.punkVal->QueryInterface(IID_IEnumVARIANT, reinterpret_cast<void**>(walk.out())), S_OK);
+    if (!walk) continue;
+    std::vector<IUnknown*> walked;
+    for (;;) {
+      VARIANT batch[3];
+      ULONG fetched = 99;
+      HRESULT hr = walk->Next(3, batch, &fetched);
+      CHECK(hr == (fetched == 3 ? S_OK : S_FALSE));
+      for (ULONG i = 0; i < fetched && i < 3; ++i) {
+        if (CHECK_EQ(batch[i].vt, VT_DISPATCH)) walked.push_back(Identity(batch[i].pdispVal));
+        VariantClear(&batch[i]);
+      }
+      if (hr != S_OK) break;
+    }
+    CHECK(walked == byKey);
+    CHECK_HR(walk->Reset(), S_OK);
+    CHECK_HR(walk->Skip(static_cast<ULONG>(expected)), S_OK);
+    VARIANT none;
+    VariantInit(&none);
+    ULONG fetched = 99;
+    CHECK_HR(walk->Next(1, &none, &fetched), S_FALSE);
+    CHECK_EQ(fetched, 0ul);
+    CHECK_HR(walk->Reset(), S_OK);
+    CHECK_HR(walk->Skip(static_cast<ULONG>(expected) + 1), S_FALSE);
+    // A clone goes on from where its walk was, on its own.
+    walk->Reset();
+    walk->Skip(1);
+    Ref<IEnumVARIANT> clone;
+    CHECK_HR(walk->Clone(clone.out()), S_OK);
+    VARIANT second;
+    if (clone && CHECK_HR(clone->Next(1, &second, nullptr), S_OK)) {
+      CHECK(second.vt == VT_DISPATCH && byKey.size() > 1 && Identity(second.pdispVal) == byKey[1]);
+      VariantClear(&second);
+      CHECK_HR(walk->Next(1, &second, nullptr), S_OK);
+      CHECK(second.vt == VT_DISPATCH && byKey.size() > 1 && Identity(second.pdispVal) == byKey[1]);
+      VariantClear(&second);
+    }
+  }
+}
+
 // --------------------------------------------------------- unloading
 
 using CanUnloadNow = HRESULT(STDAPICALLTYPE*)();
@@ -893,8 +1038,22 @@ void ReferencesAndUnloading(HMODULE addin) {
     CHECK_HR(canUnload(), S_FALSE);
     Outcome set = Call(scanner.get(), IdOf(scanner.get(), L"Delimitors"), Flags::Get);
     CHECK_EQ(set.result.v.vt, VT_DISPATCH);
+    // A walk over the code icons outlives its collection and the add-in
+    // object: it is the library's own, and holds it.
+    Outcome icons = Call(api.get(), IdOf(api.get(), L"CodeIcons"), Flags::Get);
+    Ref<IUnknown> walk;
+    if (CHECK(icons.result.v.vt == VT_DISPATCH && icons.result.v.pdispVal)) {
+      Outcome newEnum = Call(icons.result.v.pdispVal, DISPID_NEWENUM, Flags::MethodOrGet);
+      if (CHECK_EQ(newEnum.result.v.vt, VT_UNKNOWN) && newEnum.result.v.punkVal) {
+        newEnum.result.v.punkVal->AddRef();
+        walk = Ref<IUnknown>(newEnum.result.v.punkVal);
+      }
+    }
+    icons.result = Var();
     api.reset();
     scanner.reset();
+    CHECK_HR(canUnload(), S_FALSE);
+    walk.reset();
     // The delimiter set still held is the Scripting Runtime's, not the add-in's.
     CHECK_HR(canUnload(), S_OK);
   }
@@ -968,7 +1127,8 @@ int main(int argc, char** argv) {
   TokenScannerThroughIDispatch();
   BridgeAgainstHostObjects();
   ObservedServing();
-  PlatformOverWin32(paths);
+  PlatformOverWin32(paths, addin);
+  CodeIcons();
   // A window needs a screen (run.sh gives the run one).
   if (!addin)
     std::printf("prompt window: not tested, kpxaddin.dll did not load\n");

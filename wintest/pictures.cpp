@@ -28,30 +28,21 @@
 
 namespace {
 
-// The warnings as the element events show them: the resource component's
-// texts, "%1" filled with a relation's text.
+// The warnings as the element events show them: the registered resource
+// component's texts, "%1" filled with a relation's text.
 struct Picture {
   const char* file;
-  const char* message;
-  const char* title;
+  int32_t messageId;
+  int32_t titleId;
   int32_t kind;
   int32_t helpContext;
   const char* helpFile;
 };
 
 const Picture kPictures[] = {
-    {"prompt-inherit-information",
-     "The interface already has a base interface. An interface can have only one, so the older inherit relation "
-     "IShape is deleted.",
-     "Base interface replaced", 64, 0, ""},
-    {"prompt-realize-critical",
-     "A realize relation goes from a coclass to the interface it implements. This one goes from an interface to a "
-     "coclass and is left as drawn.",
-     "Realize relation", 16, 0, ""},
-    {"prompt-help-available",
-     "A coclass can realize only classes stereotyped \"interface\". This relation is left as drawn, and nothing is "
-     "implemented.",
-     "Realize relation", 16, 1050, "C:\\Program Files\\Quarn\\kpxaddin.hlp"},
+    {"prompt-inherit-information", 5046, 5047, 64, 0, ""},
+    {"prompt-realize-critical", 5048, 5049, 16, 0, ""},
+    {"prompt-help-available", 5050, 5049, 16, 1050, "C:\\Program Files\\Quarn\\kpxaddin.hlp"},
 };
 
 struct Shot {
@@ -145,7 +136,8 @@ int main(int argc, char** argv) {
       HANDLE thread = CreateThread(nullptr, 0, Photograph, &shot, 0, nullptr);
       try {
         kpx::KpxPrompt prompt(world.ui, resources);
-        prompt.Initialize(p.message, p.title, p.kind, false, p.helpContext, p.helpFile, false);
+        prompt.Initialize(resources.GetResourceString(p.messageId, "IWidget -> IBase1"),
+                          resources.GetResourceString(p.titleId), p.kind, false, p.helpContext, p.helpFile, false);
       } catch (const std::exception& e) {
         std::fprintf(stderr, "kpx-pictures: %s: %s\n", p.file, e.what());
       }

@@ -298,6 +298,8 @@ void LayoutAndOwner(HMODULE addin) {
   CHECK(ten.message.bottom - ten.message.top >= 10 * lineHeight);
   CHECK(wrapped.message.bottom - wrapped.message.top >= 5 * lineHeight);
   CHECK(ten.client.bottom > oneLine.client.bottom);
+  // Short lines make a narrow message; a paragraph wraps at a wider one.
+  CHECK(ten.message.right - ten.message.left < wrapped.message.right - wrapped.message.left);
   // The long paragraph wraps: the window stays within a screen's width.
   CHECK(wrapped.window.right - wrapped.window.left < GetSystemMetrics(SM_CXSCREEN));
   for (const Geometry* g : {&oneLine, &ten, &wrapped, &bare}) {
@@ -347,7 +349,7 @@ class Screen final : public kpx::platform::UserInterface {
     uint32_t command;
     uint64_t data;
   };
-  explicit Screen(HMODULE addin) : real_(addin) {}
+  Screen(kpx::win32::ComBridge& bridge, HMODULE addin) : real_(bridge, addin) {}
   PromptOutcome ShowPrompt(const PromptView& view, PromptHelp& help) override { return real_.ShowPrompt(view, help); }
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override {
     return real_.MessageBox(text, title, style);
@@ -357,6 +359,9 @@ class Screen final : public kpx::platform::UserInterface {
     return true;
   }
   void DoEvents() override { real_.DoEvents(); }
+  kpx::ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override {
+    return real_.LoadIconPicture(resourceId, pixels);
+  }
   std::vector<HelpCall> helps;
 
  private:
@@ -398,7 +403,7 @@ void ScriptedUserPlaysPrompts(HMODULE addin) {
     native.QueuePromptAnswer(a);
     played.QueuePromptAnswer(a);
   }
-  Screen screen(addin);
+  Screen screen(bridge, addin);
   std::vector<std::pair<bool, int16_t>> nativeResults, comResults;
   for (const Call& c : calls) {
     kpx::KpxPrompt prompt(native, resources);

@@ -6,6 +6,7 @@
 #include "addin/find_addin.h"
 #include "automation/error_styles.h"
 #include "automation/vb_strings.h"
+#include "dialogs/code_icons.h"
 #include "shared/host_ids.h"
 #include "shared/shared_addinmanager.h"
 
@@ -183,6 +184,23 @@ ObjectPtr API::TypeLibImporter() {
       module_.DebugLog("kpxAddin.Get TypeLibImporter(): " + onError.description(), logid::ADDIN, loglevel::ERROR);
   }
   return theTypeLibImporter_;
+}
+
+// ------------------------------------------------------------- code icons
+
+CodeIconsHolder& API::TheCodeIconsHolder() {
+  if (!codeIconsHolder_) codeIconsHolder_ = std::make_unique<CodeIconsHolder>(module_.platform().ui);
+  return *codeIconsHolder_;
+}
+
+ObjectPtr API::CodeIcons() {
+  TraceEntry("CodeIcons");
+  return TheCodeIconsHolder().GetCodeIcons();
+}
+
+ObjectPtr API::LargeCodeIcons() {
+  TraceEntry("LargeCodeIcons");
+  return TheCodeIconsHolder().GetLargeCodeIcons();
 }
 
 // ------------------------------------------------------------- activation

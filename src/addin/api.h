@@ -6,6 +6,7 @@
 #include <array>
 #include <cstdint>
 #include <map>
+#include <memory>
 #include <optional>
 #include <span>
 #include <vector>
@@ -44,6 +45,8 @@ enum class MenuText : uint8_t {
   EndSubmenu,           // "endsubmenu"
   Count
 };
+
+class CodeIconsHolder;
 
 class API final : public Object {
  public:
@@ -130,6 +133,10 @@ class API final : public Object {
   int32_t OnImportATL(ObjectPtr& QuarnApp);
   int32_t RenderClass(ObjectPtr& QuarnApp, ObjectPtr& aClass);
 
+  // The code icons, small and large: a keyed collection of pictures each.
+  ObjectPtr CodeIcons();
+  ObjectPtr LargeCodeIcons();
+
   // The user drawing and changing the model.
   void OnNewModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem);
   void OnModifiedModelElement(const ObjectPtr& armiQuarnApp, const ObjectPtr& armiQuarnItem, int32_t aintReason);
@@ -178,6 +185,7 @@ class API final : public Object {
   // activation (every object of one kind answers a name with one id).
   Variant CallNamed(const ObjectPtr& object, std::string_view name, std::optional<DispId>& id, CallKind kind,
                     std::initializer_list<Variant> args = {});
+  CodeIconsHolder& TheCodeIconsHolder();
 
   Module& module_;
   ObjectPtr theFirstObject_;  // a companion cache the host never fills; cleared with the rest
@@ -200,6 +208,7 @@ class API final : public Object {
     std::optional<DispId> activeDiagram, addClass, clientClasses, supplierClasses;
   } hostNameIds_;
   std::map<std::string, std::string, NoCaseLess> UserCommands_;
+  std::unique_ptr<CodeIconsHolder> codeIconsHolder_;  // made on first use
   // The element events' state: their warning flags, cached settings and
   // the ATL assistant.
   ElementEvents elementEvents_;

@@ -1,6 +1,7 @@
 #include "automation/collection.h"
 
 #include "automation/automation_error.h"
+#include "automation/enumerator.h"
 #include "automation/vb_strings.h"
 
 namespace kpx {
@@ -69,6 +70,14 @@ Variant Collection::Invoke(DispId id, CallKind kind, std::span<Variant> args) {
       Expect(args, 0, 0);
       items_.clear();
       return {};
+    case kNewEnum: {
+      // For Each walks the items as they are now.
+      Expect(args, 0, 0);
+      std::vector<Variant> items;
+      items.reserve(items_.size());
+      for (const Entry& e : items_) items.push_back(e.item);
+      return ObjectPtr(std::make_shared<Enumerator>(std::move(items)));
+    }
     default:
       throw AutomationError(vberr::kNoSuchMember);
   }

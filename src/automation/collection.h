@@ -4,7 +4,8 @@
 // key (compared without regard to case, as Visual Basic's collections do),
 // and keep the order they were added in. The dispatch ids of the members
 // the host's class collections share are the host's, so code that fills a
-// host collection fills this one the same way.
+// host collection fills this one the same way. _NewEnum hands out an
+// Enumerator over the items, which COM clients walk with For Each.
 #pragma once
 
 #include <cstdint>

@@ -150,6 +150,22 @@ struct PromptOutcome {
   bool dontShow = false;   // the check box was ticked
 };
 
+// ---------------------------------------------------------------- pictures
+
+// The standard picture object (StdPicture) as automation reaches it: its
+// members' dispatch ids, and the type of an icon.
+inline constexpr DispId kPictureHandle = 0;
+inline constexpr DispId kPicturePalette = 2;
+inline constexpr DispId kPictureType = 3;
+inline constexpr DispId kPictureWidth = 4;   // HIMETRIC (0.01 mm)
+inline constexpr DispId kPictureHeight = 5;  // HIMETRIC
+inline constexpr int16_t kPictureTypeIcon = 3;
+
+// A length in pixels of a 96 dpi screen as HIMETRIC, rounded as pictures
+// measure themselves, and back.
+constexpr int32_t PixelsToHimetric(int32_t pixels) { return (pixels * 2540 + 48) / 96; }
+constexpr int32_t HimetricToPixels(int32_t himetric) { return (himetric * 96 + 1270) / 2540; }
+
 class UserInterface {
  public:
   virtual ~UserInterface() = default;
@@ -163,6 +179,10 @@ class UserInterface {
   virtual bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) = 0;
   // Lets the host process its pending window messages once.
   virtual void DoEvents() = 0;
+  // One of the add-in's own icon resources, drawn `pixels` wide and high,
+  // as a standard picture object of type icon. Raises 326 when the add-in
+  // has no icon of that id.
+  virtual ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) = 0;
 };
 
 // Everything outside, handed to the add-in's module as one.

@@ -3,6 +3,7 @@
 #include <limits>
 
 #include "automation/automation_error.h"
+#include "automation/enumerator.h"
 #include "platform/win32/com_errors.h"
 #include "platform/win32/dispatch_object.h"
 #include "platform/win32/object_dispatch.h"
@@ -150,6 +151,12 @@ void ComBridge::ToCom(const Variant& value, VARIANT* out) {
       return;
     }
     case VarType::Object:
+      // A walk leaves as the IEnumVARIANT For Each asks _NewEnum for.
+      if (auto walk = std::dynamic_pointer_cast<Enumerator>(v.objectOrNull())) {
+        out->vt = VT_UNKNOWN;
+        out->punkVal = new EnumVariantServer(*this, std::move(walk));
+        return;
+      }
       out->vt = VT_DISPATCH;
       out->pdispVal = Expose(v.objectOrNull());
       return;

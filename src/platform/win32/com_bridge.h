@@ -69,7 +69,8 @@ class ComBridge {
   // through). Raises 13 for kinds the core does not know (arrays, ...).
   Variant FromCom(const VARIANT& in);
   // Writes `value` into `out` (which holds nothing that needs freeing). A
-  // by-reference Variant is written as the value it refers to.
+  // by-reference Variant is written as the value it refers to; an
+  // Enumerator of the core as a VT_UNKNOWN IEnumVARIANT over it.
   void ToCom(const Variant& value, VARIANT* out);
 
   // A foreign IDispatch as an Object; one of ours comes back as itself.

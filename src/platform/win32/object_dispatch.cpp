@@ -256,3 +256,69 @@ HRESULT ObjectDispatch::InterfaceSupportsErrorInfo(REFIID iid) {
 }
 
 }  // namespace kpx::win32
+
+namespace kpx::win32 {
+
+// ------------------------------------------------------------ EnumVariantServer
+
+EnumVariantServer::EnumVariantServer(ComBridge& bridge, std::shared_ptr<Enumerator> walk)
+    : bridge_(bridge), walk_(std::move(walk)) {
+  InterlockedIncrement(&bridge_.locks().objects);
+}
+
+EnumVariantServer::~EnumVariantServer() {
+  walk_.reset();
+  InterlockedDecrement(&bridge_.locks().objects);
+}
+
+HRESULT EnumVariantServer::QueryInterface(REFIID iid, void** out) {
+  if (!out) return E_POINTER;
+  if (IsEqualIID(iid, IID_IUnknown) || IsEqualIID(iid, IID_IEnumVARIANT)) {
+    *out = static_cast<IEnumVARIANT*>(this);
+    AddRef();
+    return S_OK;
+  }
+  *out = nullptr;
+  return E_NOINTERFACE;
+}
+
+ULONG EnumVariantServer::AddRef() { return static_cast<ULONG>(InterlockedIncrement(&refs_)); }
+
+ULONG EnumVariantServer::Release() {
+  LONG n = InterlockedDecrement(&refs_);
+  if (n == 0) delete this;
+  return static_cast<ULONG>(n);
+}
+
+HRESULT EnumVariantServer::Next(ULONG count, VARIANT* items, ULONG* fetched) {
+  if (fetched) *fetched = 0;
+  if (!items) return E_POINTER;
+  // The walk moves on only once every item has crossed: a failure leaves it
+  // where it was and the caller's array empty.
+  std::span<const Variant> next = walk_->Peek(count);
+  ULONG done = 0;
+  try {
+    for (; done < next.size(); ++done) bridge_.ToCom(next[done], &items[done]);
+  } catch (...) {
+    for (ULONG i = 0; i < done; ++i) VariantClear(&items[i]);
+    return HResultFromVbNumber(CurrentError().number());
+  }
+  walk_->Skip(done);
+  if (fetched) *fetched = done;
+  return done == count ? S_OK : S_FALSE;
+}
+
+HRESULT EnumVariantServer::Skip(ULONG count) { return walk_->Skip(count) ? S_OK : S_FALSE; }
+
+HRESULT EnumVariantServer::Reset() {
+  walk_->Reset();
+  return S_OK;
+}
+
+HRESULT EnumVariantServer::Clone(IEnumVARIANT** out) {
+  if (!out) return E_POINTER;
+  *out = new EnumVariantServer(bridge_, walk_->Clone());
+  return S_OK;
+}
+
+}  // namespace kpx::win32

@@ -4,6 +4,9 @@
 
 #include "platform/win32/win32_api.h"
 
+#include <memory>
+
+#include "automation/enumerator.h"
 #include "automation/object.h"
 #include "platform/win32/com_bridge.h"
 
@@ -53,6 +56,31 @@ class ObjectDispatch final : public IDispatch, public ISupportErrorInfo, public 
   ComBridge& bridge_;
   ObjectPtr object_;
   const ExposedType* type_;
+};
+
+// Serves a walk of the core (what a collection's _NewEnum hands out) as the
+// IEnumVARIANT a For Each asks for. Items leave through the bridge as any
+// value does.
+class EnumVariantServer final : public IEnumVARIANT {
+ public:
+  // Starts with one reference, owned by the caller.
+  EnumVariantServer(ComBridge& bridge, std::shared_ptr<Enumerator> walk);
+
+  HRESULT STDMETHODCALLTYPE QueryInterface(REFIID iid, void** out) override;
+  ULONG STDMETHODCALLTYPE AddRef() override;
+  ULONG STDMETHODCALLTYPE Release() override;
+
+  HRESULT STDMETHODCALLTYPE Next(ULONG count, VARIANT* items, ULONG* fetched) override;
+  HRESULT STDMETHODCALLTYPE Skip(ULONG count) override;
+  HRESULT STDMETHODCALLTYPE Reset() override;
+  HRESULT STDMETHODCALLTYPE Clone(IEnumVARIANT** out) override;
+
+ private:
+  ~EnumVariantServer();
+
+  LONG refs_ = 1;
+  ComBridge& bridge_;
+  std::shared_ptr<Enumerator> walk_;
 };
 
 }  // namespace kpx::win32

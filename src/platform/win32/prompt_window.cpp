@@ -64,13 +64,14 @@ SIZE Dlu(HWND dialog, int x, int y) {
   return {r.right, r.bottom};
 }
 
-// The text's extent in the control's font: on one line when `width` is 0,
-// else wrapped at `width` as the static control wraps it.
+// The text's extent in the control's font: broken only at its own line
+// breaks when `width` is 0 (as wide as its widest line), else also wrapped
+// at `width` as the static control wraps it.
 SIZE Measure(HWND control, const std::wstring& text, int width, UINT flags) {
   HDC dc = GetDC(control);
   HGDIOBJ old = SelectObject(dc, reinterpret_cast<HFONT>(SendMessageW(control, WM_GETFONT, 0, 0)));
   RECT r = {0, 0, width, 0};
-  const UINT wrap = width > 0 ? DT_WORDBREAK : DT_SINGLELINE;
+  const UINT wrap = width > 0 ? DT_WORDBREAK : 0;
   // An empty text measures as one empty line.
   const std::wstring measured = text.empty() ? std::wstring(L" ") : text;
   DrawTextW(dc, measured.c_str(), static_cast<int>(measured.size()), &r, flags | wrap | DT_CALCRECT);

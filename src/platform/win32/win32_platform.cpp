@@ -237,6 +237,28 @@ bool Win32UserInterface::WinHelp(int64_t window, std::string_view helpFile, uint
                   static_cast<ULONG_PTR>(data)) != 0;
 }
 
+ObjectPtr Win32UserInterface::LoadIconPicture(int32_t resourceId, int32_t pixels) {
+  HINSTANCE module = resources_ ? resources_ : GetModuleHandleW(nullptr);
+  // Not shared: the picture owns the icon and destroys it when it goes.
+  HICON icon = static_cast<HICON>(
+      LoadImageW(module, MAKEINTRESOURCEW(resourceId), IMAGE_ICON, pixels, pixels, LR_DEFAULTCOLOR));
+  if (!icon) throw AutomationError(326, "Resource with identifier '" + std::to_string(resourceId) + "' not found");
+  PICTDESC desc = {};
+  desc.cbSizeofstruct = sizeof desc;
+  desc.picType = PICTYPE_ICON;
+  desc.icon.hicon = icon;
+  IDispatch* picture = nullptr;
+  HRESULT hr = OleCreatePictureIndirect(&desc, IID_IPictureDisp, TRUE, reinterpret_cast<void**>(&picture));
+  if (FAILED(hr) || !picture) {
+    DestroyIcon(icon);
+    throw ErrorFromHResult(FAILED(hr) ? hr : E_NOINTERFACE);
+  }
+  // Wrapped, so that it leaves through the bridge as the picture itself.
+  ObjectPtr object = bridge_.Adopt(picture);
+  picture->Release();
+  return object;
+}
+
 void Win32UserInterface::DoEvents() {
   // One pass over what is waiting now; a quit request is left for the
   // host's own loop.

@@ -50,17 +50,21 @@ class Win32ObjectFactory final : public platform::ObjectFactory {
   ComBridge& bridge_;
 };
 
-// `resources` is the module holding the add-in's dialog templates (its
-// DLL); without it the prompt cannot be shown.
+// `resources` is the module holding the add-in's own resources (its DLL):
+// the dialog templates, without which the prompt cannot be shown, and the
+// icons, which leave as OLE pictures (the program's own module when null).
 class Win32UserInterface final : public platform::UserInterface {
  public:
-  explicit Win32UserInterface(HINSTANCE resources = nullptr) : resources_(resources) {}
+  explicit Win32UserInterface(ComBridge& bridge, HINSTANCE resources = nullptr)
+      : bridge_(bridge), resources_(resources) {}
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
+  ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override;
 
  private:
+  ComBridge& bridge_;
   HINSTANCE resources_;
 };
 
@@ -68,7 +72,8 @@ class Win32UserInterface final : public platform::UserInterface {
 class Win32Platform {
  public:
   // `resources`: as for Win32UserInterface.
-  explicit Win32Platform(ComBridge& bridge, HINSTANCE resources = nullptr) : objects_(bridge), ui_(resources) {}
+  explicit Win32Platform(ComBridge& bridge, HINSTANCE resources = nullptr)
+      : objects_(bridge), ui_(bridge, resources) {}
   Win32Platform(const Win32Platform&) = delete;
   Win32Platform& operator=(const Win32Platform&) = delete;
 
