@@ -125,7 +125,9 @@ bool Inside(const RECT& inner, const RECT& outer) {
 
 void TextsIconsAndHelp(HMODULE addin) {
   Group("the prompt window shows the view's texts, the one icon of its kind, and Help enabled only when available");
-  kpx::win32::Win32UserInterface ui(addin);
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   const struct {
     PromptIcon icon;
     bool help;
@@ -161,7 +163,9 @@ void TextsIconsAndHelp(HMODULE addin) {
 
 void ButtonsAndBox(HMODULE addin) {
   Group("Help opens the topic with the prompt's own window, which stays open; the tick, Cancel and the close box come back");
-  kpx::win32::Win32UserInterface ui(addin);
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   {
     HelpRecorder help;
     bool openAfterHelp = false;
@@ -236,7 +240,9 @@ void ButtonsAndBox(HMODULE addin) {
   }
   {
     // Without the module that holds the template there is no window.
-    kpx::win32::Win32UserInterface without;
+    kpx::win32::ServerLocks locks;
+    kpx::win32::ComBridge bridge(locks);
+    kpx::win32::Win32UserInterface without(bridge);
     HelpRecorder help;
     int32_t number = 0;
     try {
@@ -274,7 +280,9 @@ Geometry GeometryOf(HWND prompt, PromptIcon icon) {
 
 void LayoutAndOwner(HMODULE addin) {
   Group("the prompt grows with its message, keeps its controls apart and inside, and opens over the active window");
-  kpx::win32::Win32UserInterface ui(addin);
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
   HelpRecorder help;
   PromptOutcome outcome;
 
