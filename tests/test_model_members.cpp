@@ -43,7 +43,6 @@ class NamedObject final : public FakeObject {
 };
 
 constexpr DispId kRole1 = 901, kRole2 = 902, kAssociation = 903, kStart = 904;
-constexpr const char* kCompProperties = "{CFD996E3-1393-11D3-B9F3-006008BF3ACB}";
 constexpr const char* kLangProperties = "{05D99488-AB9F-11D2-B9EB-006008BF3ACB}";
 
 std::shared_ptr<NamedObject> Element(const std::string& label, const std::string& kind, test::Journal* j) {
@@ -74,15 +73,9 @@ class ModelMembersTest : public ::testing::Test {
     assistant->On(kStart, "StartModelAssistant", [this](Args a) -> Variant {
       started.assign(a.begin(), a.end());
       for (Variant& v : started) v = v.deref();
-      if (replacement) a[0].assign(Variant(replacement));
       return assistantAnswer;
     });
     world.factory.makers["kpxModelAssist.API"] = [this] { return ObjectPtr(assistant); };
-    world.factory.makers[kCompProperties] = [this] {
-      auto c = std::make_shared<FakeObject>("comp", j);
-      c->On(3, "ShowComponentOptions", [](Args) -> Variant { return true; }).Operation(3, 3);
-      return ObjectPtr(c);
-    };
     world.factory.makers[kLangProperties] = [this] {
       auto c = std::make_shared<FakeObject>("lang", j);
       c->On(1, "ShowProperties", [](Args a) -> Variant { return a[1].toInt32() == 2; });
@@ -118,7 +111,6 @@ class ModelMembersTest : public ::testing::Test {
   std::string installDirectory = "C:\\Quarn\\vc";
   std::vector<Variant> started;
   Variant assistantAnswer = true;
-  ObjectPtr replacement;
   std::shared_ptr<API> api;
 };
 
@@ -136,44 +128,6 @@ TEST_F(ModelMembersTest, WithoutAnItemTheLanguagePagesOpenAtTheAskedPageBelowThr
             0u);
   // Nothing is an object reference: asking it for its kind fails, to the host.
   EXPECT_EQ(vberr::kObjectNotSet, ErrorNumberOf([&] { Properties(Variant::Nothing()); }));
-}
-
-TEST_F(ModelMembersTest, EachKindOpensItsPageWithTheClassAndTheItem) {
-  auto cls = Element("cls", "Class", j);
-  auto module = Element("module", "Module", j);
-  auto op = Element("op", "Operation", j);
-  auto attr = Element("attr", "Attribute", j);
-  auto has = Element("has", "HasRelation", j);
-  op->On(hostid::kOperationParentClass, "ParentClass", [cls](Args) -> Variant { return ObjectPtr(cls); });
-  attr->On(hostid::kAttributeParentClass, "ParentClass", [cls](Args) -> Variant { return ObjectPtr(cls); });
-  has->On(hostid::kGetClient, "GetClient", [cls](Args) -> Variant { return ObjectPtr(cls); });
-
-  EXPECT_TRUE(Properties(Variant(ObjectPtr(module))));
-  EXPECT_EQ(world.journal, (test::Journal{"module.IdentifyClass", "comp.ShowComponentOptions <obj>"}));
-  EXPECT_TRUE(world.factory.created.back() == kCompProperties);
-  EXPECT_EQ(Log().find("OnProperties: Calling ModelAssistant."), std::string::npos);
-
-  struct Case {
-    ObjectPtr item;
-    ObjectPtr shown;  // the assistant's third argument
-  };
-  for (const Case& c : {Case{cls, nullptr}, Case{op, op}, Case{attr, attr}, Case{has, has}}) {
-    started.clear();
-    EXPECT_TRUE(Properties(Variant(c.item)));
-    ASSERT_EQ(started.size(), 3u);
-    EXPECT_EQ(started[0], Variant(ObjectPtr(app)));
-    EXPECT_EQ(started[1], Variant(ObjectPtr(cls)));
-    EXPECT_TRUE(started[2].isObject());
-    EXPECT_EQ(started[2].objectOrNull(), c.shown);
-  }
-  // The assistant's answer is the result; the application it hands back is kept.
-  assistantAnswer = Variant();
-  replacement = std::make_shared<FakeObject>("other app", nullptr);
-  EXPECT_FALSE(Properties(Variant(ObjectPtr(cls))));
-  EXPECT_EQ(api->QuarnApp(), replacement);
-  EXPECT_NE(Log().find(" TRACE    ADDIN     kpxAddin.ModelAssistantAPI()\r\n"
-                       " TRACE    ADDIN     kpxAddin.OnProperties: Calling ModelAssistant.\r\n"),
-            std::string::npos);
 }
 
 TEST_F(ModelMembersTest, KindsAreComparedExactlyAndOthersAreUnknown) {
@@ -232,64 +186,8 @@ TEST_F(ModelMembersTest, AnAssistantThatCannotBeMadeIsLoggedAndAFailingOneRaises
 
 // ------------------------------------------------------------------ expansion
 
-// A class that answers its clients and suppliers, each time in new wrappers.
-std::shared_ptr<NamedObject> RelatedClass(const std::string& label, test::Journal* j,
-                                          std::vector<ObjectPtr>* clients = nullptr,
-                                          std::vector<ObjectPtr>* suppliers = nullptr) {
-  auto c = Element(label, "Class", j);
-  auto listed = [](std::vector<ObjectPtr>* items) {
-    return [items](Args) -> Variant {
-      auto list = std::make_shared<Collection>();
-      if (items)
-        for (const ObjectPtr& o : *items) list->Add(Variant(ObjectPtr(std::make_shared<Wrapper>(o))));
-      return ObjectPtr(list);
-    };
-  };
-  c->On(910, "GetClientClasses", listed(clients)).On(911, "GetSupplierClasses", listed(suppliers));
-  return c;
-}
-
-TEST_F(ModelMembersTest, ExpansionAddsEachRelatedClassOnceClientsFirst) {
-  auto base = RelatedClass("base", j), user = RelatedClass("user", j), peer = RelatedClass("peer", j);
-  std::vector<ObjectPtr> clientsOfA{user, peer}, suppliersOfA{base, user};
-  std::vector<ObjectPtr> clientsOfB{ObjectPtr()}, suppliersOfB{base};
-  auto a = RelatedClass("A", j, &clientsOfA, &suppliersOfA);
-  auto b = RelatedClass("B", j, &clientsOfB, &suppliersOfB);
-  clientsOfB[0] = a;  // a selected class is on the diagram already
-  auto note = Element("note", "Note", j);
-  std::vector<ObjectPtr> selection{a, note, b};
-  std::vector<std::string> added;
-  auto diagram = std::make_shared<NamedObject>("diagram", j);
-  diagram->On(920, "AddClass", [&](Args x) -> Variant {
-    auto* fake = dynamic_cast<const FakeObject*>(static_cast<const Object*>(x[0].toObject()->Identity()));
-    added.push_back(fake ? fake->label() : "?");
-    return added.back() != "peer";  // the diagram shows "peer" already
-  });
-  model = std::make_shared<FakeObject>("model", j);
-  model->On(hostid::kGetSelectedItems, "GetSelectedItems", [&](Args) -> Variant {
-          auto list = std::make_shared<Collection>();
-          for (const ObjectPtr& o : selection) list->Add(Variant(o));
-          return ObjectPtr(list);
-        })
-      .On(930, "GetActiveDiagram", [&](Args) -> Variant { return ObjectPtr(diagram); });
-
-  std::string both = "CClass_ExpandBoth";
-  ObjectPtr host = app;
-  EXPECT_FALSE(api->OnSelectedContextMenuItem(host, both));
-  EXPECT_EQ(added, (std::vector<std::string>{"user", "peer", "base"}));
-  EXPECT_NE(Log().find(" TRACE    ADDIN     kpxAddin.ExpandClassDiagram: 2 classes added.\r\n"), std::string::npos);
-  EXPECT_EQ(std::count(j->begin(), j->end(), "note.GetClientClasses"), 0) << "only classes are expanded";
-  EXPECT_EQ(std::count(j->begin(), j->end(), "model.GetActiveDiagram"), 1) << "one look serves both";
-  EXPECT_EQ(diagram->lookUps, 1);
-
-  added.clear();
-  std::string suppliers = "CClass_ExpandSuppliers";
-  EXPECT_FALSE(api->OnSelectedContextMenuItem(host, suppliers));
-  EXPECT_EQ(added, (std::vector<std::string>{"base", "user"}));
-}
-
 TEST_F(ModelMembersTest, AHostThatCannotExpandIsReportedOtherFailuresGoBack) {
-  auto a = RelatedClass("A", j);
+  auto a = Element("A", "Class", j);
   model = std::make_shared<FakeObject>("model", j);
   model->On(hostid::kGetSelectedItems, "GetSelectedItems", [&](Args) -> Variant {
     auto list = std::make_shared<Collection>();
@@ -353,44 +251,32 @@ TEST(StereotypeFile, OnlyWholeLinesOfTheWantedSectionCount) {
   EXPECT_EQ(SectionStereotypes("Item=Class\nStereotype=x\n", kComponentSection), V{});
 }
 
-TEST_F(ModelMembersTest, TheStereotypeFileIsFoundThroughTheAddInAndTheRegistry) {
-  auto list = [&](bool classes) { return classes ? api->ClassStereotypes() : api->ComponentStereotypes(); };
-  // No value in the registry: no list, no file read.
-  EXPECT_TRUE(list(true).isNothing());
+// Each step that cannot locate the file ends the search: no list, and
+// nothing more asked of the host or read.
+TEST_F(ModelMembersTest, AFileThatCannotBeLocatedGivesNoList) {
+  auto list = [&] { return api->ClassStereotypes(); };
+  EXPECT_TRUE(list().isNothing());  // no value in the registry
   EXPECT_NE(Log().find(" TRACE    ADDIN     kpxAddin.ClassStereotypes()\r\n TRACE    ADDIN     kpxAddin.QuarnApp()\r\n"),
             std::string::npos);
+  EXPECT_EQ(std::count_if(j->begin(), j->end(), [](const std::string& e) { return e.rfind("read ", 0) == 0; }), 0);
 
-  StereotypeFile("types\\vc.cfg");
-  world.files.at("C:\\Quarn\\vc\\types\\vc.cfg") = "Item=Component\nStereotype=EXE\nStereotype=EXE\nItem=Class\n";
-  j->clear();
-  const Variant components = list(false);
-  ASSERT_TRUE(components.isObject());
-  auto* c = dynamic_cast<Collection*>(components.objectOrNull().get());
-  ASSERT_NE(c, nullptr);
-  ASSERT_EQ(c->size(), 2u);
-  EXPECT_EQ(c->At(2), Variant("EXE"));
-  EXPECT_EQ(j->back(), "read C:\\Quarn\\vc\\types\\vc.cfg");
-  // A file without the section gives an empty list, not none.
-  const Variant classes = list(true);
-  ASSERT_FALSE(classes.isNothing());
-  EXPECT_EQ(CallMethod(classes.toObject(), Collection::kCount).toInt32(), 0);
-
-  // The file cannot be opened: the error goes to the host.
-  world.files.files.clear();
-  EXPECT_EQ(vberr::kFileNotFound, ErrorNumberOf([&] { list(true); }));
-  world.files.folders.insert("c:\\quarn\\vc\\types\\vc.cfg");
-  EXPECT_EQ(vberr::kPathFileAccess, ErrorNumberOf([&] { list(true); }));
-
-  // No install directory: nothing else is asked for.
+  StereotypeFile("vc.cfg");
+  world.files.at("C:\\Quarn\\vc\\vc.cfg") = "Item=Class\nStereotype=EXE\n";
   installDirectory = "";
   j->clear();
-  EXPECT_TRUE(list(true).isNothing());
-  EXPECT_EQ(std::count(j->begin(), j->end(), "vc.InstallDirectory"), 1);
+  EXPECT_TRUE(list().isNothing());
   EXPECT_EQ(std::count(j->begin(), j->end(), "vc.RegistryRoot"), 0);
-  // No add-in "VC++": no list.
+
   installDirectory = "C:\\Quarn\\vc";
-  addInName = "vc++";
-  EXPECT_TRUE(list(false).isNothing());
+  addInName = "vc++";  // the add-in's name differs in case: no add-in "VC++"
+  j->clear();
+  EXPECT_TRUE(list().isNothing());
+  EXPECT_EQ(std::count(j->begin(), j->end(), "vc.InstallDirectory"), 0);
+  addInName = "VC++";
+  const Variant found = list();
+  auto* c = dynamic_cast<Collection*>(found.objectOrNull().get());
+  ASSERT_NE(c, nullptr);
+  EXPECT_EQ(c->size(), 1u);
 }
 
 TEST(StereotypeFile, ThePathIsJoinedAsItStands) {
