@@ -40,7 +40,7 @@ void BM_DebugLogWrittenLine(benchmark::State& state) {
   world.registry.CreateKey(RootKey::LocalMachine, kDebugSettingsKey);
   RegistrySetValue(world.registry, RootKey::LocalMachine, kDebugSettingsKey, "Debug", Variant(0x7F000080),
                    platform::kRegDword);
-  platform::Platform platform{world.registry, files, world.clock, world.factory, world.ui};
+  platform::Platform platform{world.registry, files, world.clock, world.factory, world.ui, world.processes};
   DebugLogger logger{platform};
   for (auto _ : state) logger.DebugLog("kpxAddin.OnActivate(QuarnApp)", logid::ADDIN, loglevel::TRACE);
   std::filesystem::remove_all(sandbox);

@@ -410,4 +410,36 @@ ObjectPtr RecordingObjectFactory::CreateInstance(std::string_view clsid, std::st
   return Record({{"clsid", clsid}, {"iid", iid}}, [&] { return inner_.CreateInstance(clsid, iid); });
 }
 
+
+// Not there yet on this platform.
+std::optional<uint32_t> RecordingFileSystem::GetAttributes(std::string_view) { RaiseNotImplemented("GetAttributes"); }
+bool RecordingFileSystem::SetAttributes(std::string_view, uint32_t) { RaiseNotImplemented("SetAttributes"); }
+bool RecordingFileSystem::RemoveFile(std::string_view) { RaiseNotImplemented("RemoveFile"); }
+bool RecordingFileSystem::MoveFile(std::string_view, std::string_view) { RaiseNotImplemented("MoveFile"); }
+std::optional<platform::DateTime> RecordingFileSystem::FileDateTime(std::string_view) { RaiseNotImplemented("FileDateTime"); }
+bool RecordingFileSystem::ReplaceText(std::string_view, std::string_view) { RaiseNotImplemented("ReplaceText"); }
+platform::FileHandle RecordingFileSystem::OpenForTimes(std::string_view) { RaiseNotImplemented("OpenForTimes"); }
+bool RecordingFileSystem::GetFileTimes(platform::FileHandle, platform::FileTimes&) { RaiseNotImplemented("GetFileTimes"); }
+bool RecordingFileSystem::SetFileTimes(platform::FileHandle, const platform::FileTimes&) { RaiseNotImplemented("SetFileTimes"); }
+void RecordingFileSystem::CloseFile(platform::FileHandle) { RaiseNotImplemented("CloseFile"); }
+const platform::FileError& RecordingFileSystem::LastError() { RaiseNotImplemented("LastError"); }
+std::optional<platform::FileTime> VirtualClock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
+std::optional<platform::FileTime> RecordingClock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
+void SimUserInterface::ShowRestoreDialog(platform::RestoreForm&, const platform::HostPlacement&) {
+  RaiseNotImplemented("ShowRestoreDialog");
+}
+platform::DependencyOutcome SimUserInterface::ShowDependencyDialog(const platform::DependencyView&) {
+  RaiseNotImplemented("ShowDependencyDialog");
+}
+
+
+bool SimProcesses::CreateProcess(std::string_view, std::string_view, platform::ProcessRecord&) {
+  RaiseNotImplemented("CreateProcess");
+}
+uint32_t SimProcesses::WaitForInputIdle(int64_t, uint32_t) { RaiseNotImplemented("WaitForInputIdle"); }
+uint32_t SimProcesses::WaitForSingleObject(int64_t, uint32_t) { RaiseNotImplemented("WaitForSingleObject"); }
+bool SimProcesses::GetExitCodeProcess(int64_t, uint32_t&) { RaiseNotImplemented("GetExitCodeProcess"); }
+bool SimProcesses::CloseHandle(int64_t) { RaiseNotImplemented("CloseHandle"); }
+uint32_t SimProcesses::LastError() { RaiseNotImplemented("LastError"); }
+
 }  // namespace kpx::sim

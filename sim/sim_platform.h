@@ -40,6 +40,7 @@ class VirtualClock final : public platform::Clock {
   platform::DateTime date_;
   double seconds_ = 0;
   double step_ = 0;
+  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 class RecordingClock final : public platform::Clock {
@@ -52,6 +53,7 @@ class RecordingClock final : public platform::Clock {
  private:
   platform::Clock& inner_;
   EventLog& log_;
+  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 // ----------------------------------------------------------- user interface
@@ -102,6 +104,20 @@ class SimUserInterface final : public platform::UserInterface {
   EventLog& log_;
   std::deque<int> answers_;
   std::deque<PromptAnswer> promptAnswers_;
+  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
+  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
+};
+
+// Child processes as the model answers them.
+class SimProcesses final : public platform::Processes {
+ public:
+  bool CreateProcess(std::string_view applicationName, std::string_view commandLine,
+                     platform::ProcessRecord& record) override;
+  uint32_t WaitForInputIdle(int64_t process, uint32_t milliseconds) override;
+  uint32_t WaitForSingleObject(int64_t handle, uint32_t milliseconds) override;
+  bool GetExitCodeProcess(int64_t process, uint32_t& exitCode) override;
+  bool CloseHandle(int64_t handle) override;
+  uint32_t LastError() override;
 };
 
 // ---------------------------------------------------------------- registry
@@ -174,6 +190,17 @@ class RecordingFileSystem final : public platform::FileSystem {
   platform::FileSystem& inner_;
   EventLog& log_;
   DebugLogLocator& debugLog_;
+  std::optional<uint32_t> GetAttributes(std::string_view path) override;
+  bool SetAttributes(std::string_view path, uint32_t attributes) override;
+  bool RemoveFile(std::string_view path) override;
+  bool MoveFile(std::string_view from, std::string_view to) override;
+  std::optional<platform::DateTime> FileDateTime(std::string_view path) override;
+  bool ReplaceText(std::string_view path, std::string_view text) override;
+  platform::FileHandle OpenForTimes(std::string_view path) override;
+  bool GetFileTimes(platform::FileHandle file, platform::FileTimes& times) override;
+  bool SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) override;
+  void CloseFile(platform::FileHandle file) override;
+  const platform::FileError& LastError() override;
 };
 
 // Lays out the model's folders and files before the run. The platform's

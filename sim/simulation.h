@@ -95,6 +95,7 @@ class Simulation {
   World world_;
   VirtualClock clock_;
   SimUserInterface ui_;
+  SimProcesses processes_;
   SimObjectFactory factory_;
   FaultyRegistry faultyRegistry_;  // unrecorded: for finding the debug log
   DebugLogLocator debugLog_;

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <functional>
+#include <optional>
 #include <map>
 #include <memory>
 #include <set>
@@ -130,6 +131,91 @@ class MemoryFiles : public platform::FileSystem {
   }
   std::string& at(std::string_view path) { return files[LCase(path)]; }
 
+  // What the restore routines use. Attributes, dates and times are kept
+  // per lower-case path beside the text; a missing entry reads as archive,
+  // the date 2026-11-01 10:00:00, times all zero.
+  std::optional<uint32_t> GetAttributes(std::string_view path) override {
+    if (!Exists(path)) return Fail(vberr::kFileNotFound), std::nullopt;
+    auto it = attributes.find(LCase(path));
+    return it == attributes.end() ? platform::kAttributeArchive : it->second;
+  }
+  bool SetAttributes(std::string_view path, uint32_t value) override {
+    if (!Exists(path)) return Fail(vberr::kFileNotFound);
+    attributes[LCase(path)] = value;
+    return true;
+  }
+  bool RemoveFile(std::string_view path) override {
+    if (journal) journal->push_back("kill " + std::string(path));
+    const std::string key = LCase(path);
+    if (!files.count(key)) return Fail(vberr::kFileNotFound);
+    if (undeletable.count(key) || (attributes[key] & platform::kAttributeReadOnly)) return Fail(kPermissionDenied);
+    Forget(key);
+    return true;
+  }
+  bool MoveFile(std::string_view from, std::string_view to) override {
+    if (journal) journal->push_back("move " + std::string(from) + " > " + std::string(to));
+    const std::string a = LCase(from), b = LCase(to);
+    if (!files.count(a)) return Fail(vberr::kFileNotFound);
+    if (files.count(b)) return Fail(kFileExists);
+    if (unmovable.count(a)) return Fail(kPermissionDenied);
+    files[b] = files[a];
+    if (attributes.count(a)) attributes[b] = attributes[a];
+    if (times.count(a)) times[b] = times[a];
+    if (dates.count(a)) dates[b] = dates[a];
+    Forget(a);
+    return true;
+  }
+  std::optional<platform::DateTime> FileDateTime(std::string_view path) override {
+    if (!Exists(path)) return Fail(vberr::kFileNotFound), std::nullopt;
+    auto it = dates.find(LCase(path));
+    return it == dates.end() ? platform::DateTime{2026, 11, 1, 10, 0, 0} : it->second;
+  }
+  bool ReplaceText(std::string_view path, std::string_view text) override {
+    if (journal) journal->push_back("replace " + std::string(path));
+    if (failing.count(LCase(path))) return Fail(vberr::kPathFileAccess);
+    files[LCase(path)] = std::string(text);
+    return true;
+  }
+  platform::FileHandle OpenForTimes(std::string_view path) override {
+    const std::string key = LCase(path);
+    if (!files.count(key) || locked.count(key)) return Fail(kPermissionDenied), platform::kNoFile;
+    open.push_back(key);
+    return static_cast<platform::FileHandle>(open.size() - 1);
+  }
+  bool GetFileTimes(platform::FileHandle h, platform::FileTimes& t) override {
+    t = times[open.at(h)];
+    return true;
+  }
+  bool SetFileTimes(platform::FileHandle h, const platform::FileTimes& t) override {
+    times[open.at(h)] = t;
+    return true;
+  }
+  void CloseFile(platform::FileHandle h) override { open.at(h).clear(); }
+  const platform::FileError& LastError() override { return lastError; }
+
+  static constexpr int32_t kFileExists = 58, kPermissionDenied = 70;
+  bool Fail(int32_t number) {
+    lastError = {number, VbErrorDescription(number)};
+    return false;
+  }
+  void Forget(const std::string& key) {
+    files.erase(key);
+    attributes.erase(key);
+    times.erase(key);
+    dates.erase(key);
+  }
+  bool AllClosed() const {
+    for (const std::string& h : open)
+      if (!h.empty()) return false;
+    return true;
+  }
+  std::map<std::string, uint32_t> attributes;
+  std::map<std::string, platform::FileTimes> times;
+  std::map<std::string, platform::DateTime> dates;
+  std::set<std::string> undeletable, unmovable, locked;  // lower-case paths
+  std::vector<std::string> open;                         // by handle; "" once closed
+  platform::FileError lastError;
+
   std::map<std::string, std::string> files;  // by lower-case path
   std::set<std::string> failing;             // lower-case paths
   std::set<std::string> folders;             // lower-case paths
@@ -147,6 +233,9 @@ class FakeClock : public platform::Clock {
   }
   platform::DateTime Now() override { return now; }
   void Sleep(uint32_t ms) override { sleeps.push_back(ms); }
+  std::optional<platform::FileTime> SystemFileTime() override { return fileTime; }
+
+  std::optional<platform::FileTime> fileTime = 134080000000000000ull;
 
   float seconds = 11232.5f;
   float step = 0;
@@ -187,6 +276,22 @@ class FakeUi : public platform::UserInterface {
     pictures[resourceId] = picture;
     return picture;
   }
+  // The Restore dialog is played by `playRestore`, which acts on the form
+  // as a user would; without it the dialog is closed at once with OK.
+  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& where) override {
+    if (journal) journal->push_back("ShowRestoreDialog");
+    placements.push_back(where);
+    if (playRestore) playRestore(form);
+    else form.Ok();
+  }
+  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override {
+    dependencyViews.push_back(view);
+    return dependencyAnswer;
+  }
+  std::function<void(platform::RestoreForm&)> playRestore;
+  std::vector<platform::HostPlacement> placements;
+  std::vector<platform::DependencyView> dependencyViews;
+  platform::DependencyOutcome dependencyAnswer;
   std::vector<std::pair<int32_t, int32_t>> iconLoads;  // resource id, pixels
   std::set<int32_t> missingIcons;
   std::map<int32_t, ObjectPtr> pictures;  // the last made of each id
@@ -195,6 +300,54 @@ class FakeUi : public platform::UserInterface {
   bool pressHelp = false;
   std::vector<std::string> boxes, help;
   Journal* journal = nullptr;
+};
+
+// Child processes by program name: each starts (or fails with
+// `startError`), waits with `waitResult` and exits with `exitCode`. The
+// journal shows the calls.
+class FakeProcesses : public platform::Processes {
+ public:
+  struct Program {
+    uint32_t startError = 0;  // non-zero: creation fails with it
+    uint32_t waitResult = platform::kWaitObject0;
+    uint32_t exitCode = 0;
+    uint32_t errorAfterWait = 0;  // the last error the wait leaves
+  };
+  bool CreateProcess(std::string_view app, std::string_view commandLine, platform::ProcessRecord& r) override {
+    calls.push_back("CreateProcess " + std::string(app) + " [" + std::string(commandLine) + "]");
+    auto it = programs.find(std::string(app));
+    running = it == programs.end() ? Program{2} : it->second;
+    if (running.startError) {
+      lastError = running.startError;
+      return false;
+    }
+    r = {100, 101, 7, 8};
+    return true;
+  }
+  uint32_t WaitForInputIdle(int64_t h, uint32_t ms) override {
+    calls.push_back("WaitForInputIdle " + std::to_string(h) + " " + std::to_string(ms));
+    return 0;
+  }
+  uint32_t WaitForSingleObject(int64_t h, uint32_t ms) override {
+    calls.push_back("WaitForSingleObject " + std::to_string(h) + " " + std::to_string(ms));
+    lastError = running.errorAfterWait;
+    return running.waitResult;
+  }
+  bool GetExitCodeProcess(int64_t h, uint32_t& code) override {
+    calls.push_back("GetExitCodeProcess " + std::to_string(h));
+    code = running.exitCode;
+    return true;
+  }
+  bool CloseHandle(int64_t h) override {
+    calls.push_back("CloseHandle " + std::to_string(h));
+    return true;
+  }
+  uint32_t LastError() override { return lastError; }
+
+  std::map<std::string, Program> programs;
+  std::vector<std::string> calls;
+  Program running;
+  uint32_t lastError = 0;
 };
 
 // Creates objects from registered makers; anything else fails with 429.
@@ -233,7 +386,7 @@ struct World {
     res->On(1, "LoadResString", text).On(2, "GetString", text).Operation(1, 1);
     return res;
   }
-  platform::Platform platform() { return {registry, files, clock, factory, ui}; }
+  platform::Platform platform() { return {registry, files, clock, factory, ui, processes}; }
 
   Journal journal;
   posix::FileRegistry registry;  // in memory
@@ -241,6 +394,7 @@ struct World {
   FakeClock clock;
   FakeUi ui;
   FakeFactory factory;
+  FakeProcesses processes;
   std::map<int32_t, std::string> texts;
   std::vector<int32_t> resourceIds;
 };

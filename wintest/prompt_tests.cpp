@@ -370,6 +370,12 @@ class Screen final : public kpx::platform::UserInterface {
   kpx::ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override {
     return real_.LoadIconPicture(resourceId, pixels);
   }
+  void ShowRestoreDialog(kpx::platform::RestoreForm& form, const kpx::platform::HostPlacement& where) override {
+    real_.ShowRestoreDialog(form, where);
+  }
+  kpx::platform::DependencyOutcome ShowDependencyDialog(const kpx::platform::DependencyView& view) override {
+    return real_.ShowDependencyDialog(view);
+  }
   std::vector<HelpCall> helps;
 
  private:

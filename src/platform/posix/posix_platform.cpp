@@ -365,4 +365,29 @@ void SystemClock::Sleep(uint32_t milliseconds) {
   std::this_thread::sleep_for(std::chrono::milliseconds(milliseconds));
 }
 
+
+// Not there yet on this platform.
+std::optional<uint32_t> SandboxFileSystem::GetAttributes(std::string_view) { RaiseNotImplemented("GetAttributes"); }
+bool SandboxFileSystem::SetAttributes(std::string_view, uint32_t) { RaiseNotImplemented("SetAttributes"); }
+bool SandboxFileSystem::RemoveFile(std::string_view) { RaiseNotImplemented("RemoveFile"); }
+bool SandboxFileSystem::MoveFile(std::string_view, std::string_view) { RaiseNotImplemented("MoveFile"); }
+std::optional<platform::DateTime> SandboxFileSystem::FileDateTime(std::string_view) { RaiseNotImplemented("FileDateTime"); }
+bool SandboxFileSystem::ReplaceText(std::string_view, std::string_view) { RaiseNotImplemented("ReplaceText"); }
+platform::FileHandle SandboxFileSystem::OpenForTimes(std::string_view) { RaiseNotImplemented("OpenForTimes"); }
+bool SandboxFileSystem::GetFileTimes(platform::FileHandle, platform::FileTimes&) { RaiseNotImplemented("GetFileTimes"); }
+bool SandboxFileSystem::SetFileTimes(platform::FileHandle, const platform::FileTimes&) { RaiseNotImplemented("SetFileTimes"); }
+void SandboxFileSystem::CloseFile(platform::FileHandle) { RaiseNotImplemented("CloseFile"); }
+const platform::FileError& SandboxFileSystem::LastError() { RaiseNotImplemented("LastError"); }
+std::optional<platform::FileTime> SystemClock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
+
+
+bool PosixProcesses::CreateProcess(std::string_view, std::string_view, platform::ProcessRecord&) {
+  RaiseNotImplemented("CreateProcess");
+}
+uint32_t PosixProcesses::WaitForInputIdle(int64_t, uint32_t) { RaiseNotImplemented("WaitForInputIdle"); }
+uint32_t PosixProcesses::WaitForSingleObject(int64_t, uint32_t) { RaiseNotImplemented("WaitForSingleObject"); }
+bool PosixProcesses::GetExitCodeProcess(int64_t, uint32_t&) { RaiseNotImplemented("GetExitCodeProcess"); }
+bool PosixProcesses::CloseHandle(int64_t) { RaiseNotImplemented("CloseHandle"); }
+uint32_t PosixProcesses::LastError() { RaiseNotImplemented("LastError"); }
+
 }  // namespace kpx::posix

@@ -82,6 +82,29 @@ class SandboxFileSystem final : public platform::FileSystem {
   // complete; names since deleted are checked for on the disk.
   using Spellings = std::unordered_map<std::string, std::vector<std::string>>;
   mutable std::unordered_map<std::string, Spellings> listings_;
+  std::optional<uint32_t> GetAttributes(std::string_view path) override;
+  bool SetAttributes(std::string_view path, uint32_t attributes) override;
+  bool RemoveFile(std::string_view path) override;
+  bool MoveFile(std::string_view from, std::string_view to) override;
+  std::optional<platform::DateTime> FileDateTime(std::string_view path) override;
+  bool ReplaceText(std::string_view path, std::string_view text) override;
+  platform::FileHandle OpenForTimes(std::string_view path) override;
+  bool GetFileTimes(platform::FileHandle file, platform::FileTimes& times) override;
+  bool SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) override;
+  void CloseFile(platform::FileHandle file) override;
+  const platform::FileError& LastError() override;
+};
+
+// Child processes of this machine.
+class PosixProcesses final : public platform::Processes {
+ public:
+  bool CreateProcess(std::string_view applicationName, std::string_view commandLine,
+                     platform::ProcessRecord& record) override;
+  uint32_t WaitForInputIdle(int64_t process, uint32_t milliseconds) override;
+  uint32_t WaitForSingleObject(int64_t handle, uint32_t milliseconds) override;
+  bool GetExitCodeProcess(int64_t process, uint32_t& exitCode) override;
+  bool CloseHandle(int64_t handle) override;
+  uint32_t LastError() override;
 };
 
 // The machine's clock in local time.
@@ -90,6 +113,7 @@ class SystemClock final : public platform::Clock {
   float Timer() override;
   platform::DateTime Now() override;
   void Sleep(uint32_t milliseconds) override;
+  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 }  // namespace kpx::posix

@@ -27,6 +27,17 @@ class Win32FileSystem final : public platform::FileSystem {
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
   std::string ReadText(std::string_view path) override;
+  std::optional<uint32_t> GetAttributes(std::string_view path) override;
+  bool SetAttributes(std::string_view path, uint32_t attributes) override;
+  bool RemoveFile(std::string_view path) override;
+  bool MoveFile(std::string_view from, std::string_view to) override;
+  std::optional<platform::DateTime> FileDateTime(std::string_view path) override;
+  bool ReplaceText(std::string_view path, std::string_view text) override;
+  platform::FileHandle OpenForTimes(std::string_view path) override;
+  bool GetFileTimes(platform::FileHandle file, platform::FileTimes& times) override;
+  bool SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) override;
+  void CloseFile(platform::FileHandle file) override;
+  const platform::FileError& LastError() override;
 };
 
 class Win32Clock final : public platform::Clock {
@@ -34,6 +45,7 @@ class Win32Clock final : public platform::Clock {
   float Timer() override;
   platform::DateTime Now() override;
   void Sleep(uint32_t milliseconds) override;
+  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 // Objects come from COM; the ones that answer IDispatch are wrapped for the
@@ -66,6 +78,20 @@ class Win32UserInterface final : public platform::UserInterface {
  private:
   ComBridge& bridge_;
   HINSTANCE resources_;
+  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
+  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
+};
+
+// Child processes through kernel32.
+class Win32Processes final : public platform::Processes {
+ public:
+  bool CreateProcess(std::string_view applicationName, std::string_view commandLine,
+                     platform::ProcessRecord& record) override;
+  uint32_t WaitForInputIdle(int64_t process, uint32_t milliseconds) override;
+  uint32_t WaitForSingleObject(int64_t handle, uint32_t milliseconds) override;
+  bool GetExitCodeProcess(int64_t process, uint32_t& exitCode) override;
+  bool CloseHandle(int64_t handle) override;
+  uint32_t LastError() override;
 };
 
 // All of it, handed to the core as one platform::Platform.
@@ -77,7 +103,7 @@ class Win32Platform {
   Win32Platform(const Win32Platform&) = delete;
   Win32Platform& operator=(const Win32Platform&) = delete;
 
-  platform::Platform platform() { return {registry_, files_, clock_, objects_, ui_}; }
+  platform::Platform platform() { return {registry_, files_, clock_, objects_, ui_, processes_}; }
 
  private:
   Win32Registry registry_;
@@ -85,6 +111,7 @@ class Win32Platform {
   Win32Clock clock_;
   Win32ObjectFactory objects_;
   Win32UserInterface ui_;
+  Win32Processes processes_;
 };
 
 }  // namespace kpx::win32
