@@ -8,6 +8,7 @@
 
 #include "automation/automation_error.h"
 #include "shared/host_ids.h"
+#include "sim/host_objects.h"
 #include "test_sim_support.h"
 
 namespace kpx::sim::test {
@@ -46,8 +47,6 @@ TEST(SimRestoreModel, FilesTakeTextReadOnlyAndTimesAndPlainFilesTheClocksStart) 
       "C:\\src\\empty.cpp": {}
     }})");
   posix::SandboxFileSystem& files = w.files();
-  EXPECT_EQ(files.ReadText("C:\\src\\b.cpp"), "kept");
-  EXPECT_EQ(files.ReadText("C:\\src\\empty.cpp"), "");
   const FileTimes a = TimesOf(files, "C:\\src\\a.cpp");
   EXPECT_EQ(Text(a.creation), "2026-11-20 08:30:00");
   EXPECT_EQ(Text(a.lastAccess), "2026-11-20 08:30:00");
@@ -66,6 +65,9 @@ TEST(SimRestoreModel, FilesTakeTextReadOnlyAndTimesAndPlainFilesTheClocksStart) 
   EXPECT_EQ(date->day, 2);
   EXPECT_EQ(date->hour, 10);
   EXPECT_EQ(date->second, 12);
+  // Read last: reading sets a file's access time.
+  EXPECT_EQ(files.ReadText("C:\\src\\b.cpp"), "kept");
+  EXPECT_EQ(files.ReadText("C:\\src\\empty.cpp"), "");
 
   // A read-only file is replaced whole by a setFile step, and stamped with
   // the clock's time then.

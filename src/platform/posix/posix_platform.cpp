@@ -633,10 +633,14 @@ bool SandboxFileSystem::ReplaceText(std::string_view path, std::string_view text
     ::unlink(temp.c_str());
     return Fail(vberr::kPathFileAccess);
   }
-  if (!Step(ReplaceStep::Rename) || ::rename(temp.c_str(), host.c_str()) != 0) {
+  if (!Step(ReplaceStep::Rename)) {
+    ::unlink(temp.c_str());
+    return Fail(vberr::kPathFileAccess);
+  }
+  if (::rename(temp.c_str(), host.c_str()) != 0) {
     const int err = errno;
     ::unlink(temp.c_str());
-    return err == 0 ? Fail(vberr::kPathFileAccess) : FailErrno(err, host);
+    return FailErrno(err, host);
   }
   Remember(host);
   if (created) creation_[host.string()] = *created;
