@@ -27,22 +27,28 @@ std::string FieldOf(std::string_view record, int index) {
   return field;
 }
 
+DifferenceSetting ParseDifferenceSetting(std::string_view setting) {
+  DifferenceSetting parsed;
+  if (setting.empty()) return parsed;
+  parsed.caption.clear();
+  parsed.command = Trim(setting);
+  if (const size_t bar = parsed.command.find('|'); bar != std::string::npos) {
+    parsed.caption = Trim(parsed.command.substr(bar + 1));
+    parsed.command = Trim(parsed.command.substr(0, bar));
+  }
+  if (parsed.caption.empty()) parsed.caption = EqualsNoCase(parsed.command, "windiff") ? "WinDiff" : "Differences";
+  return parsed;
+}
+
 bool DifferenceTool::InitDifferenceTool(const ObjectPtr& QuarnApp, const ObjectPtr& VCAddin) {
   QuarnApp_ = QuarnApp;
   VCAddin_ = VCAddin;
   command_ = "windiff";
   toolName_ = "WinDiff";
-  const std::string setting =
-      CallMethod(VCAddin, hostid::kReadSetting, {Variant("Events"), Variant("OnDifference"), Variant("")})
-          .toString();
-  if (setting.empty()) return true;
-  toolName_.clear();
-  command_ = Trim(setting);
-  if (const size_t bar = command_.find('|'); bar != std::string::npos) {
-    toolName_ = Trim(command_.substr(bar + 1));
-    command_ = Trim(command_.substr(0, bar));
-  }
-  if (toolName_.empty()) toolName_ = EqualsNoCase(command_, "windiff") ? "WinDiff" : "Differences";
+  const DifferenceSetting setting = ParseDifferenceSetting(
+      CallMethod(VCAddin, hostid::kReadSetting, {Variant("Events"), Variant("OnDifference"), Variant("")}).toString());
+  command_ = setting.command;
+  toolName_ = setting.caption;
   return true;
 }
 
@@ -65,6 +71,24 @@ std::string FillPlaceholders(std::string_view arguments, std::string_view backup
 }
 
 }  // namespace
+
+ShellCommand ParseShellCommand(std::string_view command, std::string_view backup, std::string_view source) {
+  const std::string work = std::string(command) + " ";
+  const size_t verbEnd = work.find(' ');
+  const std::string rest = Trim(work.substr(verbEnd)) + " ";
+  ShellCommand shell;
+  size_t end;
+  if (rest.front() == '"') {
+    end = rest.find('"', 1);
+    if (end == std::string::npos) end = rest.find(' ');
+    shell.program = rest.substr(1, end - 1);
+  } else {
+    end = rest.find(' ');
+    shell.program = rest.substr(0, end);
+  }
+  shell.arguments = FillPlaceholders(Trim(rest.substr(end + 1)), backup, source);
+  return shell;
+}
 
 bool DifferenceTool::RunDifference(std::string_view restoreItem) {
   const std::string source = FieldOf(restoreItem, 3);
@@ -93,19 +117,8 @@ bool DifferenceTool::RunDifference(std::string_view restoreItem) {
           CallByName(tool, "OnDifference", CallKind::Method, {Variant(backup), Variant(source)});
           return module_.error().number == 0;
         }
-        const std::string rest = Trim(work.substr(verb.size())) + " ";
-        std::string program;
-        size_t end;
-        if (rest.front() == '"') {
-          end = rest.find('"', 1);
-          if (end == std::string::npos) end = rest.find(' ');
-          program = rest.substr(1, end - 1);
-        } else {
-          end = rest.find(' ');
-          program = rest.substr(0, end);
-        }
-        const std::string arguments = FillPlaceholders(Trim(rest.substr(end + 1)), backup, source);
-        return RunChildProcess(module_, program, arguments, kTimeout) && module_.error().number == 0;
+        const ShellCommand shell = ParseShellCommand(command_, backup, source);
+        return RunChildProcess(module_, shell.program, shell.arguments, kTimeout) && module_.error().number == 0;
       },
       [&](const AutomationError& e) {
         SetError(module_, e.number(), e.description());

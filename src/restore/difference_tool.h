@@ -21,6 +21,20 @@ std::string SplitField(std::string& rest);
 // The `index`-th field (1-based) of a record; "" beyond its last.
 std::string FieldOf(std::string_view record, int index);
 
+// The "OnDifference" setting read: the command and the menu caption.
+struct DifferenceSetting {
+  std::string command = "windiff";
+  std::string caption = "WinDiff";
+};
+DifferenceSetting ParseDifferenceSetting(std::string_view setting);
+
+// A "shell" command taken apart: the program, and the arguments with "%1"
+// filled with the backup and "%2" with the source.
+struct ShellCommand {
+  std::string program, arguments;
+};
+ShellCommand ParseShellCommand(std::string_view command, std::string_view backup, std::string_view source);
+
 class DifferenceTool {
  public:
   explicit DifferenceTool(Module& module) : module_(module) {}

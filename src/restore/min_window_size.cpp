@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 
+#include "automation/automation_error.h"
 #include "automation/vb_strings.h"
 #include "shared/shared_debug_logger.h"
 
@@ -15,6 +16,15 @@ namespace {
 // named level, so that only a mask asking for them shows them.
 constexpr int32_t kLayoutLogId = 4;
 constexpr int32_t kLayoutLevel = 7;
+}  // namespace
+
+namespace {
+// A number of a tag as a Single: one too large for it overflows (6).
+float SingleOf(std::string_view text) {
+  const double value = Val(text);
+  if (std::fabs(value) > 3.402823466e38) throw AutomationError(vberr::kOverflow);
+  return static_cast<float>(value);
+}
 }  // namespace
 
 LayoutEntry ParseLayoutTag(std::string_view tag, char letter) {
@@ -28,11 +38,11 @@ LayoutEntry ParseLayoutTag(std::string_view tag, char letter) {
   size_t end = e;
   entry.count = 1;
   if (c != std::string_view::npos && c < e) {
-    entry.second = static_cast<float>(Val(tag.substr(c + 1, e - c - 1)));
+    entry.second = SingleOf(tag.substr(c + 1, e - c - 1));
     entry.count = 2;
     end = c;
   }
-  entry.first = static_cast<float>(Val(tag.substr(p + 2, end - (p + 2))));
+  entry.first = SingleOf(tag.substr(p + 2, end - (p + 2)));
   return entry;
 }
 

@@ -19,7 +19,8 @@ struct LayoutEntry {
   int count = 0;  // numbers found: 0 when the letter is absent
 };
 
-// The entry of `letter` (letter case counts) in `tag`.
+// The entry of `letter` (letter case counts) in `tag`. A number too large
+// for a Single raises Overflow (6).
 LayoutEntry ParseLayoutTag(std::string_view tag, char letter);
 
 // A control as layout sees it, in twips.

@@ -15,8 +15,16 @@ constexpr int kMbYesNo = 4;
 constexpr int kMbInformation = 64;
 constexpr int kIdYes = 6;
 
-// A text file's lines as Line Input reads them: ended by CR LF, a CR or a LF.
-std::vector<std::string> LinesOf(const std::string& text) {
+// A restore item without its two project fields: the list-file line.
+std::string ListLineOf(std::string_view item) {
+  const size_t first = item.find('|');
+  const size_t second = first == std::string_view::npos ? first : item.find('|', first + 1);
+  return second == std::string_view::npos ? std::string() : std::string(item.substr(second + 1));
+}
+
+}  // namespace
+
+std::vector<std::string> ListFileLines(const std::string& text) {
   std::vector<std::string> lines;
   std::string line;
   for (size_t i = 0; i < text.size(); ++i) {
@@ -32,15 +40,6 @@ std::vector<std::string> LinesOf(const std::string& text) {
   if (!line.empty()) lines.push_back(std::move(line));
   return lines;
 }
-
-// A restore item without its two project fields: the list-file line.
-std::string ListLineOf(std::string_view item) {
-  const size_t first = item.find('|');
-  const size_t second = first == std::string_view::npos ? first : item.find('|', first + 1);
-  return second == std::string_view::npos ? std::string() : std::string(item.substr(second + 1));
-}
-
-}  // namespace
 
 std::string BackupListPath(Module& module, std::string_view first, std::string_view second) {
   if (first.empty() || second.empty()) return {};
@@ -103,7 +102,7 @@ void RestoreSource::LoadBackupRecord(KpxRestoreForm& form, const std::string& re
         const std::string listPath = FieldOf(record, 3);
         if (listPath.empty() || !FileExists(files, listPath)) return;
         std::vector<std::string> kept;
-        for (const std::string& raw : LinesOf(files.ReadText(listPath))) {
+        for (const std::string& raw : ListFileLines(files.ReadText(listPath))) {
           const std::string line = Trim(raw);
           if (line.empty()) continue;
           if (FileExists(files, FieldOf(line, 2))) kept.push_back(line);

@@ -22,6 +22,9 @@ namespace kpx {
 // and `second` + ".lst"; "" unless both are given.
 std::string BackupListPath(Module& module, std::string_view first, std::string_view second);
 
+// A list file's lines as Line Input reads them: ended by CR LF, a CR or a LF.
+std::vector<std::string> ListFileLines(const std::string& text);
+
 // How many of the rows have the check value `value`.
 int32_t CountNodesWithValue(const std::vector<platform::RestoreRow>& rows, const std::vector<int32_t>& which,
                             int32_t value);
