@@ -10,6 +10,8 @@ std::string VbErrorDescription(int32_t number) {
     case vberr::kTypeMismatch: return "Type mismatch";
     case vberr::kInternal: return "Internal error";
     case vberr::kFileNotFound: return "File not found";
+    case vberr::kFileAlreadyExists: return "File already exists";
+    case vberr::kPermissionDenied: return "Permission denied";
     case vberr::kPathFileAccess: return "Path/File access error";
     case vberr::kPathNotFound: return "Path not found";
     case vberr::kObjectNotSet: return "Object variable or With block variable not set";
