@@ -1,0 +1,12 @@
+// The add-in's Restore and module dependency windows, shown through the
+// Win32 platform from the templates in the loaded kpxaddin.dll, read and
+// played as a user would.
+#pragma once
+
+#include "platform/win32/win32_api.h"
+
+namespace wintest {
+
+void RestoreWindowTests(HMODULE addin);
+
+}  // namespace wintest
