@@ -30,6 +30,8 @@ constexpr int kControlIds[kControls] = {KPX_RESTORE_LIST, IDOK, IDCANCEL, IDHELP
 // The list's check-box pictures: the control's own two and a third for a
 // project only some of whose files are ticked.
 constexpr int kUnticked = 1, kTicked = 2, kSomeTicked = 3;
+// How far a file row stands in from its project's, pixels.
+constexpr int kFileIndent = 10;
 
 struct RestoreState {
   RestoreState(platform::RestoreForm& shown, const platform::HostPlacement& where) : form(shown), placement(where) {}
@@ -193,10 +195,10 @@ void FillList(HWND dialog, RestoreState& state) {
   ListView_SetExtendedListViewStyleEx(list, LVS_EX_CHECKBOXES | LVS_EX_FULLROWSELECT,
                                       LVS_EX_CHECKBOXES | LVS_EX_FULLROWSELECT);
   AddThirdCheckPicture(list);
-  // Indentation is counted in small pictures: an empty list of them gives
-  // every row the room of one and a file row that of two.
-  const int side = GetSystemMetrics(SM_CXSMICON);
-  HIMAGELIST small = ImageList_Create(side, side, ILC_COLOR32, 0, 1);
+  // Indentation is counted in widths of the small pictures. The rows have
+  // none: a list of one-pixel pictures makes the count pixels, and leaves
+  // the first column's room to the text (a file row's date is long).
+  HIMAGELIST small = ImageList_Create(1, 1, ILC_COLOR32, 0, 1);
   ListView_SetImageList(list, small, LVSIL_SMALL);  // the list destroys it with itself
 
   const platform::RestoreForm::Texts& texts = state.form.texts();
@@ -222,7 +224,7 @@ void FillList(HWND dialog, RestoreState& state) {
     item.mask = LVIF_TEXT | LVIF_INDENT | LVIF_IMAGE;
     item.iItem = static_cast<int>(i);
     item.iImage = I_IMAGENONE;
-    item.iIndent = row.project ? 0 : 1;
+    item.iIndent = row.project ? 0 : kFileIndent;
     item.pszText = text.data();
     const int at = static_cast<int>(SendMessageW(list, LVM_INSERTITEMW, 0, reinterpret_cast<LPARAM>(&item)));
     SetCell(list, at, 1, row.cells[1]);
