@@ -105,6 +105,8 @@ class API final : public Object {
   int32_t OnAddProperty(ObjectPtr& QuarnApp);
   int32_t OnImplementInterfaces(ObjectPtr& QuarnApp);
   int32_t OnExposeProperty(ObjectPtr& QuarnApp);
+  int32_t OnRestoreSource(ObjectPtr& QuarnApp);
+  int32_t OnModuleDependencyProperties(ObjectPtr& QuarnApp);
 
   // Context menus.
   bool OnSelectedContextMenuItem(ObjectPtr& QuarnApp, std::string& internalName);

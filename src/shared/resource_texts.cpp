@@ -70,7 +70,7 @@ constexpr std::array<ResourceText, 80> kTexts = {{
     // restore dialog: instructions above the list
     {5027,
      "Check the files to put back from their backups and click OK. "
-     "Click a file to compare it with its backup first."},
+     "Right-click a file to compare it with its backup first."},
     // restore source: name of the settings section holding the backup records
     {5028, "Backups"},
     // restore source: backup sub-folder, placed between the project's folder
