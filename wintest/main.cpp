@@ -1148,7 +1148,7 @@ int main(int argc, char** argv) {
     std::printf("prompt window: not tested, there is no display (DISPLAY)\n");
   else {
     PromptWindowTests(addin);
-    RestoreWindowTests(addin);
+    RestoreWindowTests(addin, Narrow(paths.scratch));
   }
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);

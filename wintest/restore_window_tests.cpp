@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "automation/automation_error.h"
+#include "shared/resource_texts.h"
 #include "check.h"
 #include "platform/win32/dependency_window_ids.h"
 #include "platform/win32/restore_window_ids.h"
@@ -21,6 +22,8 @@
 #include "prompt_reader.h"
 #include "restore_reader.h"
 #include "restore_test_form.h"
+#include "restore/kpx_restore_form.h"
+#include "shared/module.h"
 
 namespace wintest {
 
@@ -485,13 +488,100 @@ void DependencyDialog(HMODULE addin) {
   DestroyWindow(host);
 }
 
+void TheAddinsOwnForm(HMODULE addin, const std::string& scratch) {
+  Group("the add-in's own Restore form in the window: its captions, rows of real backups, header, smallest size and bounds");
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32Platform win32(bridge, addin);
+  kpx::Module module(win32.platform());
+  module.resources().InitResourceStrings();  // as the add-in does when it loads
+  const std::string folder = scratch + "\\restore";
+  CreateDirectoryA(folder.c_str(), nullptr);
+  const std::string backups[] = {folder + "\\circle.cpp.bak", folder + "\\circle.h.bak"};
+  for (const std::string& backup : backups) {
+    HANDLE file = CreateFileA(backup.c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, FILE_ATTRIBUTE_NORMAL, nullptr);
+    CHECK(file != INVALID_HANDLE_VALUE);
+    CloseHandle(file);
+  }
+  kpx::KpxRestoreForm form(module);
+  form.Reset();
+  const std::string record = "C:\\work\\Shapes\\Shapes.dsp|Shapes|" + folder + "\\Shapes.lst";
+  form.AddEntry(record, {"C:\\work\\Shapes\\circle.cpp|" + backups[0], "C:\\work\\Shapes\\circle.h|" + backups[1]});
+  form.SelectProject(record);
+  const std::string selectedTitle = form.headerTitle();
+
+  const double twips = 1440.0 / ScreenDpi();
+  RestoreSeen seen;
+  std::vector<int> ticked;
+  bool okAfterTick = false;
+  SIZE smallest = {};
+  RECT okNarrow = {}, cancelNarrow = {}, clientNarrow = {}, okWide = {}, clientWide = {}, instructions = {}, list = {};
+  WindowUser user(ShownRestoreWindows, [&](HWND dialog) {
+    seen = ReadRestore(dialog);
+    instructions = RectIn(dialog, KPX_RESTORE_INSTRUCTIONS);
+    list = RectIn(dialog, KPX_RESTORE_LIST);
+    TickRow(dialog, 0, true);
+    ticked = ReadChecks(dialog);
+    okAfterTick = IsWindowEnabled(GetDlgItem(dialog, IDOK)) != 0;
+    RECT r;
+    GetWindowRect(dialog, &r);
+    SetWindowPos(dialog, nullptr, 0, 0, 800, r.bottom - r.top, SWP_NOMOVE | SWP_NOZORDER | SWP_NOACTIVATE);
+    GetClientRect(dialog, &clientWide);
+    okWide = RectIn(dialog, IDOK);
+    for (int width = 800; width >= 300; --width)
+      SetWindowPos(dialog, nullptr, 0, 0, width, r.bottom - r.top, SWP_NOMOVE | SWP_NOZORDER | SWP_NOACTIVATE);
+    SetWindowPos(dialog, nullptr, 0, 0, 100, 100, SWP_NOMOVE | SWP_NOZORDER | SWP_NOACTIVATE);
+    GetWindowRect(dialog, &r);
+    smallest = {r.right - r.left, r.bottom - r.top};
+    GetClientRect(dialog, &clientNarrow);
+    okNarrow = RectIn(dialog, IDOK);
+    cancelNarrow = RectIn(dialog, IDCANCEL);
+    Press(dialog, IDCANCEL);
+  });
+  form.ShowRestoreDialog(nullptr);
+  CHECK(user.Finish() != nullptr);
+  CHECK(!user.leftOpen());
+  for (const std::string& backup : backups) DeleteFileA(backup.c_str());
+  RemoveDirectoryA(folder.c_str());
+
+  CHECK_EQ(seen.caption, std::string(kpx::FindResourceText(5011)));
+  CHECK_EQ(seen.instructions, std::string(kpx::FindResourceText(5027)));
+  CHECK_EQ(seen.title, selectedTitle);
+  CHECK(!seen.subtitle.empty());
+  CHECK_EQ(seen.columns[0], std::string(kpx::FindResourceText(5021)));
+  CHECK_EQ(seen.columns[1], std::string(kpx::FindResourceText(5023)));
+  CHECK_EQ(seen.columns[2], std::string(kpx::FindResourceText(5024)));
+  CHECK_EQ(seen.rows.size(), size_t{3});
+  if (seen.rows.size() == 3) {
+    CHECK_EQ(seen.rows[0].cells[0], std::string("Shapes"));
+    CHECK(seen.rows[0].selected);
+    CHECK_EQ(FindRestoreRow(seen, "C:\\work\\Shapes\\circle.h"), 2);
+    CHECK(!seen.rows[1].cells[0].empty());  // the backup's date
+  }
+  CHECK(!seen.okEnabled);
+  CHECK(ticked == (std::vector<int>{2, 2, 2}));
+  CHECK(okAfterTick);
+  // The header and the instructions stand above the list.
+  CHECK(instructions.bottom <= list.top);
+  // Its smallest size, and OK back at its bound after the window was wider.
+  CHECK_EQ(smallest.cx, static_cast<LONG>(std::lround(8610 / twips)));
+  CHECK_EQ(smallest.cy, static_cast<LONG>(std::lround(5895 / twips)));
+  CHECK(okWide.left > std::lround(5760 / twips));
+  CHECK_EQ(okNarrow.left, static_cast<LONG>(std::lround(5760 / twips)));
+  CHECK(cancelNarrow.left >= std::lround(7080 / twips) && cancelNarrow.right <= clientNarrow.right);
+  CHECK(okNarrow.right <= cancelNarrow.left);
+  // Cancel left nothing ticked for the restore.
+  CHECK(form.rows().empty());
+}
+
 }  // namespace
 
-void RestoreWindowTests(HMODULE addin) {
+void RestoreWindowTests(HMODULE addin, const std::string& scratch) {
   ShowsTheForm(addin);
   ActionsGoToTheForm(addin);
   SizeAndBounds(addin);
   ManyRowsAndFailures(addin);
+  TheAddinsOwnForm(addin, scratch);
   DependencyDialog(addin);
 }
 

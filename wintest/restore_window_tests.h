@@ -5,8 +5,11 @@
 
 #include "platform/win32/win32_api.h"
 
+#include <string>
+
 namespace wintest {
 
-void RestoreWindowTests(HMODULE addin);
+// `scratch`: a folder for the backups the add-in's own form lists.
+void RestoreWindowTests(HMODULE addin, const std::string& scratch);
 
 }  // namespace wintest

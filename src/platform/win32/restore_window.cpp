@@ -42,7 +42,7 @@ struct RestoreState {
   double twipsX = 15, twipsY = 15;  // per pixel, read from the screen when the window opens
   POINT minimum = {0, 0};           // tracking size, pixels
   ControlRect rects[kControls];     // where the form has its controls now, twips
-  int bandHeight = 0;               // the header and instructions at the top of the list's place
+  int bandHeight = 0;               // the header and instructions in the top of the list's place, pixels
   HFONT bold = nullptr;
   std::vector<int> shownChecks;  // picture shown per row
   std::string shownTitle, shownSubtitle;
@@ -87,13 +87,15 @@ void Place(HWND dialog, int id, int x, int y, int width, int height) {
                SWP_NOZORDER | SWP_NOACTIVATE);
 }
 
-// The header (title, subtitle) and the instructions take the top of the
-// list's place, as the list control's own header did, and never move: the
-// list's place only ever grows to the right and down. The list itself
-// fills the rest.
+// The header (title, subtitle) and the instructions stand above the list,
+// in the room the form leaves there, with the list's left margin above
+// them too; where that room is too small they take the top of the list's
+// own place instead, as the list control's own header did. They never
+// move: the list's place only ever grows to the right and down. The list
+// itself fills the rest of its place.
 void PlaceHeader(HWND dialog, RestoreState& state, const std::wstring& instructions) {
   const ControlRect& list = state.rects[size_t(RestoreControl::List)];
-  const int x = Pixels(list.left, state.twipsX), y = Pixels(list.top, state.twipsY);
+  const int x = Pixels(list.left, state.twipsX), listTop = Pixels(list.top, state.twipsY);
   const int width = Pixels(list.width, state.twipsX);
   HWND title = GetDlgItem(dialog, KPX_RESTORE_TITLE);
   HWND subtitle = GetDlgItem(dialog, KPX_RESTORE_SUBTITLE);
@@ -101,11 +103,13 @@ void PlaceHeader(HWND dialog, RestoreState& state, const std::wstring& instructi
   const int subtitleHeight = LineHeight(subtitle, reinterpret_cast<HFONT>(SendMessageW(subtitle, WM_GETFONT, 0, 0)));
   const int instructionsHeight = WrappedHeight(GetDlgItem(dialog, KPX_RESTORE_INSTRUCTIONS), instructions, width);
   const int gap = subtitleHeight / 2;
+  const int band = titleHeight + 1 + subtitleHeight + gap + instructionsHeight + gap;
+  const bool above = x + band <= listTop;
+  const int y = above ? x : listTop;
   Place(dialog, KPX_RESTORE_TITLE, x, y, width, titleHeight);
   Place(dialog, KPX_RESTORE_SUBTITLE, x, y + titleHeight + 1, width, subtitleHeight);
-  const int instructionsTop = y + titleHeight + 1 + subtitleHeight + gap;
-  Place(dialog, KPX_RESTORE_INSTRUCTIONS, x, instructionsTop, width, instructionsHeight);
-  state.bandHeight = instructionsTop + instructionsHeight + gap - y;
+  Place(dialog, KPX_RESTORE_INSTRUCTIONS, x, y + titleHeight + 1 + subtitleHeight + gap, width, instructionsHeight);
+  state.bandHeight = above ? 0 : band;
 }
 
 void PlaceControls(HWND dialog, const RestoreState& state) {
