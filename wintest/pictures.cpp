@@ -2,9 +2,9 @@
 // prompt is filled by the prompt form itself (its captions from the
 // registered resource component), shown from kpxaddin.dll's template, and
 // taken off the screen into a 24-bit BMP once it has drawn itself; then OK
-// closes it. The Restore dialog shows a form of the test host's own with
-// three projects, a project selected and some files ticked; the module
-// dependency dialog shows its text, editable and read-only.
+// closes it. The Restore dialog shows the add-in's own form with
+// three projects' backups, a project selected and some files ticked; the
+// module dependency dialog shows its text, editable and read-only.
 // scripts/pictures.sh runs it on a screen of its own and turns the BMPs
 // into PNGs.
 //
@@ -28,7 +28,8 @@
 #include "platform/win32/win32_strings.h"
 #include "prompt_reader.h"
 #include "restore_reader.h"
-#include "restore_test_form.h"
+#include "restore/kpx_restore_form.h"
+#include "shared/module.h"
 #include "shared/resource_strings.h"
 
 namespace {
@@ -184,9 +185,34 @@ int main(int argc, char** argv) {
                           resources.GetResourceString(p.titleId), p.kind, false, p.helpContext, p.helpFile, false);
       });
     }
-    wintest::TestForm form({{"Shapes", {"circle.cpp", "circle.h", "square.cpp"}},
-                            {"Brushes", {"brush.cpp"}},
-                            {"Tools", {"ruler.cpp", "ruler.h"}}});
+    // The add-in's own form, with three projects' backups made here.
+    kpx::Module module(world);
+    module.resources().InitResourceStrings();
+    kpx::KpxRestoreForm form(module);
+    const std::string backups = std::string(argv[2]) + "\\backups";
+    CreateDirectoryW(kpx::win32::Utf8ToWide(backups).c_str(), nullptr);
+    const struct {
+      const char* project;
+      std::vector<const char*> files;
+    } projects[] = {{"Shapes", {"circle.cpp", "circle.h", "square.cpp"}},
+                    {"Brushes", {"brush.cpp"}},
+                    {"Tools", {"ruler.cpp", "ruler.h"}}};
+    for (const auto& p : projects) {
+      const std::string folder = std::string("C:\\Projects\\") + p.project;
+      std::vector<std::string> lines;
+      std::string list;
+      for (const char* file : p.files) {
+        const std::string backup = backups + "\\" + file + ".bak";
+        world.files.AppendText(backup, "");
+        lines.push_back(folder + "\\" + file + "|" + backup);
+        list += lines.back() + "\r\n";
+      }
+      // The list file's date is the project's last backup, in the header.
+      const std::string listFile = backups + "\\" + p.project + ".lst";
+      world.files.DeleteFile(listFile);
+      world.files.AppendText(listFile, list);
+      form.AddEntry(folder + "\\" + p.project + ".dsp|" + p.project + "|" + listFile, lines);
+    }
     Shot restore{path("restore"), wintest::ShownRestoreWindows, PlayRestore, IDCANCEL};
     failed += !Take(restore, [&] { world.ui.ShowRestoreDialog(form, {}); });
     for (bool readOnly : {false, true}) {

@@ -89,8 +89,8 @@ void Place(HWND dialog, int id, int x, int y, int width, int height) {
 
 // The header (title, subtitle) and the instructions stand above the list,
 // in the room the form leaves there, with the list's left margin above
-// them too; where that room is too small they take the top of the list's
-// own place instead, as the list control's own header did. They never
+// them where there is room for it; where the room is too small they take
+// the top of the list's own place instead, as the list control's own header did. They never
 // move: the list's place only ever grows to the right and down. The list
 // itself fills the rest of its place.
 void PlaceHeader(HWND dialog, RestoreState& state, const std::wstring& instructions) {
@@ -104,8 +104,8 @@ void PlaceHeader(HWND dialog, RestoreState& state, const std::wstring& instructi
   const int instructionsHeight = WrappedHeight(GetDlgItem(dialog, KPX_RESTORE_INSTRUCTIONS), instructions, width);
   const int gap = subtitleHeight / 2;
   const int band = titleHeight + 1 + subtitleHeight + gap + instructionsHeight + gap;
-  const bool above = x + band <= listTop;
-  const int y = above ? x : listTop;
+  const bool above = band <= listTop;
+  const int y = above ? std::min(x, listTop - band) : listTop;
   Place(dialog, KPX_RESTORE_TITLE, x, y, width, titleHeight);
   Place(dialog, KPX_RESTORE_SUBTITLE, x, y + titleHeight + 1, width, subtitleHeight);
   Place(dialog, KPX_RESTORE_INSTRUCTIONS, x, y + titleHeight + 1 + subtitleHeight + gap, width, instructionsHeight);
@@ -206,17 +206,34 @@ void FillList(HWND dialog, RestoreState& state) {
   ListView_SetImageList(list, small, LVSIL_SMALL);  // the list destroys it with itself
 
   const platform::RestoreForm::Texts& texts = state.form.texts();
+  const std::vector<platform::RestoreRow>& rows = state.form.rows();
+  // The form's widths; the first one wider where a file row's date (in the
+  // system's own long format) would not fit in it.
+  int dateWidth = 0;
+  size_t measured = 0;
+  for (const platform::RestoreRow& row : rows) {
+    if (row.project || row.modified.size() <= measured) continue;
+    measured = row.modified.size();
+    const std::wstring date = Utf8ToWide(row.modified);
+    dateWidth = std::max<int>(dateWidth, static_cast<int>(SendMessageW(list, LVM_GETSTRINGWIDTHW, 0,
+                                                                          reinterpret_cast<LPARAM>(date.c_str()))));
+  }
+  if (dateWidth > 0) {
+    int boxWidth = 0, boxHeight = 0;
+    if (HIMAGELIST boxes = ListView_GetImageList(list, LVSIL_STATE)) ImageList_GetIconSize(boxes, &boxWidth, &boxHeight);
+    dateWidth += boxWidth + kFileIndent + 2 * GetSystemMetrics(SM_CXEDGE) + 12;  // the cell's own margins
+  }
   for (int c = 0; c < 3; ++c) {
     std::wstring header = Utf8ToWide(texts.columns[c]);
     LVCOLUMNW column = {};
     column.mask = LVCF_TEXT | LVCF_WIDTH | LVCF_SUBITEM;
     column.cx = Pixels(texts.columnTwips[c], state.twipsX);
+    if (c == 0) column.cx = std::max<int>(column.cx, dateWidth);
     column.pszText = header.data();
     column.iSubItem = c;
     SendMessageW(list, LVM_INSERTCOLUMNW, static_cast<WPARAM>(c), reinterpret_cast<LPARAM>(&column));
   }
 
-  const std::vector<platform::RestoreRow>& rows = state.form.rows();
   SendMessageW(list, WM_SETREDRAW, FALSE, 0);
   ListView_SetItemCount(list, static_cast<int>(rows.size()));
   state.shownChecks.assign(rows.size(), 0);
