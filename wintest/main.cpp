@@ -67,7 +67,7 @@ std::wstring Text(int32_t id) {
 
 std::wstring Guid(const GUID& g) { return kpx::win32::GuidToWide(g); }
 
-// The folder this program was started from (its helper programs lie there).
+// The folder this program was started from (the child program of the process tests lies there).
 std::string ProgramFolder() {
   wchar_t path[MAX_PATH] = {};
   GetModuleFileNameW(nullptr, path, MAX_PATH);
