@@ -193,7 +193,7 @@ class MemoryFiles : public platform::FileSystem {
   void CloseFile(platform::FileHandle h) override { open.at(h).clear(); }
   const platform::FileError& LastError() override { return lastError; }
 
-  static constexpr int32_t kFileExists = 58, kPermissionDenied = 70;
+  static constexpr int32_t kFileExists = vberr::kFileAlreadyExists, kPermissionDenied = vberr::kPermissionDenied;
   bool Fail(int32_t number) {
     lastError = {number, VbErrorDescription(number)};
     return false;
@@ -245,10 +245,17 @@ class FakeClock : public platform::Clock {
 
 class FakeUi : public platform::UserInterface {
  public:
+  // Message boxes are answered from `boxAnswers` in order, then with
+  // `defaultAnswer`.
   int MessageBox(std::string_view text, std::string_view, uint32_t) override {
     boxes.emplace_back(text);
-    return platform::kIdOk;
+    if (boxAnswers.empty()) return defaultAnswer;
+    const int answer = boxAnswers.front();
+    boxAnswers.erase(boxAnswers.begin());
+    return answer;
   }
+  std::vector<int> boxAnswers;
+  int defaultAnswer = platform::kIdOk;
   bool WinHelp(int64_t, std::string_view file, uint32_t, uint64_t) override {
     help.emplace_back(file);
     return true;

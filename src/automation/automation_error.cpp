@@ -11,6 +11,7 @@ std::string VbErrorDescription(int32_t number) {
     case vberr::kInternal: return "Internal error";
     case vberr::kFileNotFound: return "File not found";
     case vberr::kFileAlreadyExists: return "File already exists";
+    case vberr::kDiskFull: return "Disk full";
     case vberr::kPermissionDenied: return "Permission denied";
     case vberr::kPathFileAccess: return "Path/File access error";
     case vberr::kPathNotFound: return "Path not found";

@@ -16,6 +16,7 @@ inline constexpr int32_t kTypeMismatch = 13;        // Type mismatch
 inline constexpr int32_t kInternal = 51;            // Internal error
 inline constexpr int32_t kFileNotFound = 53;        // File not found
 inline constexpr int32_t kFileAlreadyExists = 58;   // File already exists
+inline constexpr int32_t kDiskFull = 61;            // Disk full
 inline constexpr int32_t kPermissionDenied = 70;    // Permission denied
 inline constexpr int32_t kPathFileAccess = 75;      // Path/File access error
 inline constexpr int32_t kPathNotFound = 76;        // Path not found

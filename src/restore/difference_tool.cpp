@@ -48,15 +48,20 @@ bool DifferenceTool::InitDifferenceTool(const ObjectPtr& QuarnApp, const ObjectP
 
 namespace {
 
-// Replaces every `placeholder` in `text`, going on after each inserted
-// value, so that a value holding a placeholder is left as it is.
-std::string ReplaceEach(std::string text, std::string_view placeholder, std::string_view value) {
-  size_t at = 0;
-  while ((at = text.find(placeholder, at)) != std::string::npos) {
-    text.replace(at, placeholder.size(), value);
-    at += value.size();
+// Fills "%1" with the backup and "%2" with the source in one pass from the
+// left, going on after each inserted path, so that a path holding "%1" or
+// "%2" itself is never filled in again.
+std::string FillPlaceholders(std::string_view arguments, std::string_view backup, std::string_view source) {
+  std::string out;
+  for (size_t i = 0; i < arguments.size(); ++i) {
+    if (arguments[i] == '%' && i + 1 < arguments.size() && (arguments[i + 1] == '1' || arguments[i + 1] == '2')) {
+      out += arguments[i + 1] == '1' ? backup : source;
+      ++i;
+    } else {
+      out += arguments[i];
+    }
   }
-  return text;
+  return out;
 }
 
 }  // namespace
@@ -99,9 +104,7 @@ bool DifferenceTool::RunDifference(std::string_view restoreItem) {
           end = rest.find(' ');
           program = rest.substr(0, end);
         }
-        std::string arguments = Trim(rest.substr(end + 1));
-        arguments = ReplaceEach(std::move(arguments), "%1", backup);
-        arguments = ReplaceEach(std::move(arguments), "%2", source);
+        const std::string arguments = FillPlaceholders(Trim(rest.substr(end + 1)), backup, source);
         return RunChildProcess(module_, program, arguments, kTimeout) && module_.error().number == 0;
       },
       [&](const AutomationError& e) {
