@@ -5,6 +5,7 @@
 #include "automation/vb_strings.h"
 #include "shared/resource_texts.h"
 #include "sim/host_objects.h"
+#include "sim/windows_path.h"
 
 namespace kpx::sim {
 
@@ -23,8 +24,9 @@ class FaultsReader {
   void Read(const Node& n) {
     n.ExpectObject("an object of faults");
     n.ExpectKeys({"comment", "registry", "missingResources", "readSetting", "writeSetting", "addContextMenuItem",
-                  "calls"});
+                  "calls", "files"});
     if (auto r = n.Find("registry")) ReadRegistry(*r);
+    if (auto r = n.Find("files")) ReadFiles(*r);
     if (auto r = n.Find("missingResources"))
       for (const Node& id : r->Elements()) ReadMissingResource(id);
     if (auto s = n.Find("readSetting")) ReadSettings(*s, "ReadSetting");
@@ -46,6 +48,25 @@ class FaultsReader {
   }
 
  private:
+  // ------------------------------------------------------------- files
+
+  // Path to the calls that fail on it: {"remove": {"number": 70}, ...}.
+  void ReadFiles(const Node& n) {
+    n.ExpectObject("an object: file path to the calls that fail on it");
+    for (const auto& [path, def] : n.Members()) {
+      if (const std::string fault = PathFault(path, true); !fault.empty()) n.FailKey(path, fault);
+      def.ExpectObject("an object of failing calls: remove, move, replace, times");
+      def.ExpectKeys({"comment", "remove", "move", "replace", "times"});
+      FileFaultDef f;
+      if (auto e = def.Find("remove")) f.remove = ParseError(*e);
+      if (auto e = def.Find("move")) f.move = ParseError(*e);
+      if (auto e = def.Find("replace")) f.replace = ParseError(*e);
+      if (auto e = def.Find("times")) f.times = ParseError(*e);
+      if (!f.remove && !f.move && !f.replace && !f.times) def.Fail("a file fault names at least one failing call");
+      if (!f_.files.emplace(path, f).second) n.FailKey(path, "a second fault for the file " + path + " (paths ignore case)");
+    }
+  }
+
   // ---------------------------------------------------------- registry
 
   void ReadRegistry(const Node& n) {

@@ -241,7 +241,7 @@ int Run(const Options& o, SignalGuard& guard) {
   };
 
   kpx::posix::FileRegistry registry(sandbox.dir() / "registry.reg");
-  kpx::posix::SandboxFileSystem files(sandbox.dir());
+  kpx::posix::SandboxFileSystem files(sandbox.dir(), kpx::posix::SandboxFileSystem::Zone::Utc);
   FileSeeder seeder([&files](std::string_view path) { return files.HostPath(path); });
   const RegistryBatch batch = [&registry](const std::function<void()>& seed) {
     try {

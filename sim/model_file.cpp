@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <cctype>
+#include <chrono>
 #include <cmath>
+#include <cstdio>
 #include <limits>
 #include <tuple>
 
@@ -253,6 +255,48 @@ ClockSetting ParseClock(const Node& node) {
   return c;
 }
 
+platform::FileTime ToFileTime(const platform::DateTime& date, double seconds) {
+  using namespace std::chrono;
+  const sys_days days = year_month_day{year{date.year}, month{static_cast<unsigned>(date.month)},
+                                      day{static_cast<unsigned>(date.day)}};
+  constexpr int64_t kEpoch = 11644473600LL;  // 1601-01-01 to 1970-01-01, seconds
+  const int64_t whole = (days.time_since_epoch().count() * 86400LL) + kEpoch;
+  return static_cast<platform::FileTime>(whole * 10000000LL + std::llround(seconds * 1e7));
+}
+
+platform::FileTime ParseFileTime(const Node& node) {
+  const std::string s = node.String();
+  if (s.size() != 19 || s[4] != '-' || s[7] != '-' || s[10] != ' ' || s[13] != ':' || s[16] != ':')
+    node.Fail("a file time is written YYYY-MM-DD HH:MM:SS (UTC)");
+  platform::DateTime t;
+  t.year = ParseNumberPart(node, s, 0, 4, 1601, 9999);
+  t.month = ParseNumberPart(node, s, 5, 2, 1, 12);
+  t.day = ParseNumberPart(node, s, 8, 2, 1, DaysInMonth(t.year, t.month));
+  const double seconds = ParseNumberPart(node, s, 11, 2, 0, 23) * 3600.0 +
+                         ParseNumberPart(node, s, 14, 2, 0, 59) * 60.0 + ParseNumberPart(node, s, 17, 2, 0, 59);
+  return ToFileTime(t, seconds);
+}
+
+std::string FileTimeText(platform::FileTime time) {
+  using namespace std::chrono;
+  constexpr int64_t kEpochDays = 134774;  // 1601-01-01 to 1970-01-01
+  const int64_t ticks = static_cast<int64_t>(time % 10000000);
+  const int64_t seconds = static_cast<int64_t>(time / 10000000);
+  const int64_t days = seconds / 86400;
+  const int64_t inDay = seconds % 86400;
+  const year_month_day ymd{sys_days{std::chrono::days{days - kEpochDays}}};
+  char text[48];
+  std::snprintf(text, sizeof text, "%04d-%02u-%02u %02d:%02d:%02d", static_cast<int>(ymd.year()),
+                static_cast<unsigned>(ymd.month()), static_cast<unsigned>(ymd.day()), static_cast<int>(inDay / 3600),
+                static_cast<int>(inDay / 60 % 60), static_cast<int>(inDay % 60));
+  std::string out = text;
+  if (ticks) {
+    std::snprintf(text, sizeof text, ".%07d", static_cast<int>(ticks));
+    out += text;
+  }
+  return out;
+}
+
 // ------------------------------------------------------------------ values
 
 void CheckValue(const Node& n, const ModelDef& model, const CompanionDef* owner, bool byRef) {
@@ -312,10 +356,11 @@ class ModelReader {
 
   ModelDef Read() {
     root_.ExpectKeys({"comment", "registry", "files", "folders", "clock", "application", "addins", "companions",
-                      "resources", "resourceComponent", "model", "faults"});
+                      "resources", "resourceComponent", "model", "processes", "faults"});
     if (auto n = root_.Find("registry")) m_.registry = ParseRegistry(*n);
     ReadFilesAndFolders(root_.Find("files"), root_.Find("folders"));
     if (auto n = root_.Find("clock")) m_.clock = ParseClock(*n);
+    if (auto n = root_.Find("processes")) ReadProcesses(*n);
     if (auto n = root_.Find("application")) ReadApplication(*n);
     if (auto n = root_.Find("resources")) ReadResources(*n);
     if (auto n = root_.Find("resourceComponent")) {
@@ -350,8 +395,70 @@ class ModelReader {
         std::string fault = PathFault(path, true);
         if (fault.empty()) fault = plan.WriteFile(path);
         if (!fault.empty()) files->FailKey(path, fault);
-        m_.files.emplace_back(path, content.String());
+        if (content.IsObject()) {
+          // {"text": ..., "readOnly": ..., "times": {...}}
+          content.ExpectKeys({"text", "readOnly", "times"});
+          FileDetailDef detail;
+          detail.readOnly = content.BoolOr("readOnly", false);
+          if (auto t = content.Find("times")) {
+            t->ExpectObject("an object of times: creation, lastAccess, lastWrite");
+            t->ExpectKeys({"creation", "lastAccess", "lastWrite"});
+            if (auto c = t->Find("creation")) detail.creation = ParseFileTime(*c);
+            if (auto a = t->Find("lastAccess")) detail.lastAccess = ParseFileTime(*a);
+            if (auto w = t->Find("lastWrite")) detail.lastWrite = ParseFileTime(*w);
+          }
+          m_.files.emplace_back(path, content.StringOr("text", ""));
+          m_.fileDetails[path] = detail;
+        } else {
+          m_.files.emplace_back(path, content.String());
+        }
       }
+  }
+
+  // Program path to {"exitCode": n} | {"start": {"error": n}} |
+  // {"timeout": true} | {"waitFails": {"error": n}}.
+  void ReadProcesses(const Node& n) {
+    n.ExpectObject("an object: program path to what running it gives");
+    for (const auto& [program, def] : n.Members()) {
+      if (const std::string fault = PathFault(program, true); !fault.empty()) n.FailKey(program, fault);
+      def.ExpectObject("{\"exitCode\": n}, {\"start\": {\"error\": n}}, {\"timeout\": true} or {\"waitFails\": {\"error\": n}}");
+      def.ExpectKeys({"comment", "exitCode", "start", "timeout", "waitFails"});
+      ProcessDef p;
+      int given = 0;
+      auto systemError = [](const Node& e) {
+        e.ExpectKeys({"error"});
+        const Node code = e.Member("error");
+        const int64_t v = code.Integer();
+        if (v <= 0 || v > 0xFFFFFFFFLL) code.Fail("a system error code is a number from 1 to 4294967295");
+        return static_cast<uint32_t>(v);
+      };
+      if (auto c = def.Find("exitCode")) {
+        ++given;
+        const int64_t v = c->Integer();
+        // A crash status may be written as Windows shows it, negative.
+        if (v < -2147483648LL || v > 0xFFFFFFFFLL) c->Fail("an exit code is 32 bits");
+        p.kind = ProcessDef::Kind::Exits;
+        p.exitCode = static_cast<uint32_t>(v);
+      }
+      if (auto st = def.Find("start")) {
+        ++given;
+        p.kind = ProcessDef::Kind::StartFails;
+        p.error = systemError(*st);
+      }
+      if (auto t = def.Find("timeout")) {
+        ++given;
+        if (!t->Bool()) t->Fail("\"timeout\" can only be true");
+        p.kind = ProcessDef::Kind::TimesOut;
+      }
+      if (auto w = def.Find("waitFails")) {
+        ++given;
+        p.kind = ProcessDef::Kind::WaitFails;
+        p.error = systemError(*w);
+      }
+      if (given != 1) def.Fail("a program needs exactly one of exitCode, start, timeout, waitFails");
+      if (!m_.processes.emplace(program, p).second)
+        n.FailKey(program, "a second entry for the program " + program + " (paths ignore case)");
+    }
   }
 
   void ReadApplication(const Node& n) {

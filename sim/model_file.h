@@ -154,17 +154,42 @@ struct RegistryFaultDef {
   std::map<std::string, std::optional<platform::RegistryValue>, NoCaseLess> reads;
 };
 
+// A file the add-in cannot remove, move (as the file moved), replace or
+// open for its times: each call fails with its error.
+struct FileFaultDef {
+  std::optional<ErrorDef> remove, move, replace, times;
+};
+
 struct FaultsDef {
   std::vector<CallFaultDef> calls;
   std::vector<RegistryFaultDef> registry;
   std::set<int32_t> missingResources;
+  std::map<std::string, FileFaultDef, NoCaseLess> files;  // by Windows path
 
-  bool empty() const { return calls.empty() && registry.empty() && missingResources.empty(); }
+  bool empty() const { return calls.empty() && registry.empty() && missingResources.empty() && files.empty(); }
+};
+
+// What a file of the model is besides its text: read-only or not, and its
+// three times (UTC). Times left out are the clock's start.
+struct FileDetailDef {
+  bool readOnly = false;
+  std::optional<platform::FileTime> creation, lastAccess, lastWrite;
+};
+
+// A program the add-in may start, and how the run answers it.
+struct ProcessDef {
+  enum class Kind { Exits, StartFails, TimesOut, WaitFails };
+  Kind kind = Kind::Exits;
+  uint32_t exitCode = 0;  // Exits
+  uint32_t error = 0;     // StartFails, WaitFails: the system error
 };
 
 struct ModelDef {
   std::vector<RegistryEntry> registry;  // keys and value names as REGEDIT4 can write them
   std::vector<std::pair<std::string, std::string>> files;
+  std::map<std::string, FileDetailDef> fileDetails;  // by the path as "files" writes it
+  // By the program's Windows path, letter case ignored.
+  std::map<std::string, ProcessDef, NoCaseLess> processes;
   std::vector<std::string> folders;
   ClockSetting clock;
   ApplicationDef application;
@@ -218,6 +243,13 @@ std::pair<platform::RootKey, std::string> ParseRegistryKey(const Node& registry,
 // A registry value in any of the forms of a model's "registry".
 platform::RegistryValue ParseRegistryValue(const Node& node);
 ClockSetting ParseClock(const Node& node);
+// "YYYY-MM-DD HH:MM:SS", UTC, as a file time.
+platform::FileTime ParseFileTime(const Node& node);
+// A file time as the log writes it: "YYYY-MM-DD HH:MM:SS", and the
+// fraction of the second (seven digits) when there is one.
+std::string FileTimeText(platform::FileTime time);
+// The date and seconds since midnight, taken as UTC, as a file time.
+platform::FileTime ToFileTime(const platform::DateTime& date, double seconds);
 // {"number": n, "description": "..."}
 ErrorDef ParseError(const Node& node);
 

@@ -114,6 +114,78 @@ void ReadCall(const Node& n, const ModelDef& model, Action& a) {
 
 }  // namespace
 
+namespace {
+
+// [{"tick": "row"}, {"click": "row"}, {"compare": true}, ..., "ok"]
+RestoreAnswer ReadRestoreAnswer(const Node& n) {
+  n.ExpectArray("a list of steps ending in \"ok\" or \"cancel\"");
+  RestoreAnswer answer;
+  answer.line = n.line();
+  const std::vector<Node> steps = n.Elements();
+  if (steps.empty()) n.Fail("the dialog needs a last step, \"ok\" or \"cancel\"");
+  for (size_t i = 0; i < steps.size(); ++i) {
+    const Node& step = steps[i];
+    RestoreStep s;
+    s.line = step.line();
+    const bool last = i + 1 == steps.size();
+    if (step.IsString()) {
+      const std::string button = step.String();
+      if (button != "ok" && button != "cancel") step.Fail("a button step is \"ok\" or \"cancel\"");
+      if (!last) step.Fail("\"" + button + "\" closes the dialog: it is the last step");
+      s.kind = button == "ok" ? RestoreStep::Kind::Ok : RestoreStep::Kind::Cancel;
+      answer.steps.push_back(std::move(s));
+      continue;
+    }
+    step.ExpectObject("a step: {\"tick\": row}, {\"untick\": row}, {\"select\": row}, {\"click\": row}, "
+                      "{\"compare\": true}, {\"timer\": true}, {\"help\": true}, \"ok\" or \"cancel\"");
+    const auto members = step.Members();
+    if (members.size() != 1) step.Fail("a step does one thing");
+    const auto& [what, value] = members.front();
+    static constexpr std::pair<std::string_view, RestoreStep::Kind> kRowSteps[] = {
+        {"tick", RestoreStep::Kind::Tick},
+        {"untick", RestoreStep::Kind::Untick},
+        {"select", RestoreStep::Kind::Select},
+        {"click", RestoreStep::Kind::Click}};
+    static constexpr std::pair<std::string_view, RestoreStep::Kind> kFlagSteps[] = {
+        {"compare", RestoreStep::Kind::Compare}, {"timer", RestoreStep::Kind::Timer}, {"help", RestoreStep::Kind::Help}};
+    bool known = false;
+    for (const auto& [name, kind] : kRowSteps)
+      if (what == name) {
+        s.kind = kind;
+        s.row = value.String();
+        if (s.row.empty()) value.Fail("a row is named by its project or its file's full path");
+        known = true;
+      }
+    for (const auto& [name, kind] : kFlagSteps)
+      if (what == name) {
+        if (!value.Bool()) value.Fail("write {\"" + what + "\": true}");
+        s.kind = kind;
+        known = true;
+      }
+    if (!known)
+      step.FailKey(what, "unknown step \"" + what + "\" (expected tick, untick, select, click, compare, timer, help)");
+    if (last) step.Fail("the last step closes the dialog: \"ok\" or \"cancel\"");
+    answer.steps.push_back(std::move(s));
+  }
+  return answer;
+}
+
+// {"text": "new text", "button": "ok"}
+DependencyAnswer ReadDependencyAnswer(const Node& n) {
+  n.ExpectObject("{\"text\": \"...\", \"button\": \"ok\" or \"cancel\"}");
+  n.ExpectKeys({"text", "button"});
+  DependencyAnswer answer;
+  answer.line = n.line();
+  if (auto t = n.Find("text")) answer.text = t->String();
+  const Node button = n.Member("button");
+  const std::string b = button.String();
+  if (b != "ok" && b != "cancel") button.Fail("the dialog closes with \"ok\" or \"cancel\"");
+  answer.ok = b == "ok";
+  return answer;
+}
+
+}  // namespace
+
 Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
   const Node root = Node::Root(source);
   root.ExpectKeys({"comment", "model", "actions"});
@@ -199,6 +271,12 @@ Scenario LoadScenario(const JsonSource& source, const ModelDef& model) {
           a.prompt = platform::PromptOutcome{button == "cancel", false};
           if (auto tick = body.Find("dontShow")) a.prompt->dontShow = tick->Bool();
           if (auto help = body.Find("help")) a.promptHelp = help->Bool();
+        } else if (auto steps = body.Find("restore")) {
+          body.ExpectKeys({"restore"});
+          a.restore = ReadRestoreAnswer(*steps);
+        } else if (auto dependency = body.Find("dependency")) {
+          body.ExpectKeys({"dependency"});
+          a.dependency = ReadDependencyAnswer(*dependency);
         } else {
           body.ExpectKeys({"button"});
           a.answer = body.Member("button").Int32();

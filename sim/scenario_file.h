@@ -15,6 +15,28 @@
 
 namespace kpx::sim {
 
+// How the user works the Restore dialog: steps in order, the last one
+// closing it. Rows are named by their project or their file's full path.
+struct RestoreStep {
+  enum class Kind { Tick, Untick, Select, Click, Compare, Timer, Help, Ok, Cancel };
+  Kind kind = Kind::Cancel;
+  std::string row;  // Tick, Untick, Select, Click
+  int line = 0;
+};
+
+struct RestoreAnswer {
+  std::vector<RestoreStep> steps;
+  int line = 0;
+};
+
+// How the user closes the module dependency dialog; `text` set: the user
+// edited the text to it.
+struct DependencyAnswer {
+  std::optional<std::string> text;
+  bool ok = false;
+  int line = 0;
+};
+
 struct Action {
   enum class Type { Call, Select, Answer, Clock, Release, Create, SetRegistry, SetFile, Use };
   Type type = Type::Call;
@@ -40,6 +62,9 @@ struct Action {
   // An answer for the prompt dialog rather than a message box.
   std::optional<platform::PromptOutcome> prompt;
   bool promptHelp = false;  // Help pressed before closing it
+  // An answer for the Restore dialog or the module dependency dialog.
+  std::optional<RestoreAnswer> restore;
+  std::optional<DependencyAnswer> dependency;
   ClockSetting clock;
   std::vector<RegistryEntry> registry;
   std::vector<std::pair<std::string, std::optional<std::string>>> files;  // no content: delete

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <chrono>
 #include <cmath>
+#include <cstdio>
 #include <fstream>
 #include <stdexcept>
 
@@ -351,6 +352,13 @@ void CheckFolders(std::string_view windowsPath, const std::filesystem::path& pat
   }
 }
 
+// The world replaces a file whole, read-only or not: the new file is not.
+void MakeWritable(const std::filesystem::path& path) {
+  std::error_code ec;
+  if (std::filesystem::is_regular_file(path, ec))
+    std::filesystem::permissions(path, std::filesystem::perms::owner_write, std::filesystem::perm_options::add, ec);
+}
+
 }  // namespace
 
 void FileSeeder::MakeFolder(std::string_view windowsPath) {
@@ -368,6 +376,7 @@ void FileSeeder::WriteFile(std::string_view windowsPath, std::string_view conten
     if (path.has_parent_path()) std::filesystem::create_directories(path.parent_path());
     if (std::filesystem::is_directory(path))
       throw WorldError("cannot write " + std::string(windowsPath) + ": a folder of that name is in the way");
+    MakeWritable(path);
     std::ofstream out(path, std::ios::binary | std::ios::trunc);
     out.write(content.data(), static_cast<std::streamsize>(content.size()));
     out.close();
@@ -380,6 +389,7 @@ void FileSeeder::RemoveFile(std::string_view windowsPath) {
     const std::filesystem::path path = hostPath_(windowsPath);
     if (std::filesystem::is_directory(path))
       throw WorldError("cannot delete " + std::string(windowsPath) + ": it is a folder");
+    MakeWritable(path);
     std::filesystem::remove(path);
   });
 }
@@ -411,35 +421,545 @@ ObjectPtr RecordingObjectFactory::CreateInstance(std::string_view clsid, std::st
 }
 
 
-// Not there yet on this platform.
-std::optional<uint32_t> RecordingFileSystem::GetAttributes(std::string_view) { RaiseNotImplemented("GetAttributes"); }
-bool RecordingFileSystem::SetAttributes(std::string_view, uint32_t) { RaiseNotImplemented("SetAttributes"); }
-bool RecordingFileSystem::RemoveFile(std::string_view) { RaiseNotImplemented("RemoveFile"); }
-bool RecordingFileSystem::MoveFile(std::string_view, std::string_view) { RaiseNotImplemented("MoveFile"); }
-std::optional<platform::DateTime> RecordingFileSystem::FileDateTime(std::string_view) { RaiseNotImplemented("FileDateTime"); }
-bool RecordingFileSystem::ReplaceText(std::string_view, std::string_view) { RaiseNotImplemented("ReplaceText"); }
-platform::FileHandle RecordingFileSystem::OpenForTimes(std::string_view) { RaiseNotImplemented("OpenForTimes"); }
-bool RecordingFileSystem::GetFileTimes(platform::FileHandle, platform::FileTimes&) { RaiseNotImplemented("GetFileTimes"); }
-bool RecordingFileSystem::SetFileTimes(platform::FileHandle, const platform::FileTimes&) { RaiseNotImplemented("SetFileTimes"); }
-void RecordingFileSystem::CloseFile(platform::FileHandle) { RaiseNotImplemented("CloseFile"); }
-const platform::FileError& RecordingFileSystem::LastError() { RaiseNotImplemented("LastError"); }
-std::optional<platform::FileTime> VirtualClock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
-std::optional<platform::FileTime> RecordingClock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
-void SimUserInterface::ShowRestoreDialog(platform::RestoreForm&, const platform::HostPlacement&) {
-  RaiseNotImplemented("ShowRestoreDialog");
-}
-platform::DependencyOutcome SimUserInterface::ShowDependencyDialog(const platform::DependencyView&) {
-  RaiseNotImplemented("ShowDependencyDialog");
+// ------------------------------------------------------------ file times
+
+std::optional<platform::FileTime> VirtualClock::SystemFileTime() { return ToFileTime(date_, seconds_); }
+
+// ------------------------------------------------------- restore file calls
+
+namespace {
+
+EventJson FileErrorJson(const platform::FileError& e) {
+  return {{"number", e.number}, {"description", e.description}};
 }
 
-
-bool SimProcesses::CreateProcess(std::string_view, std::string_view, platform::ProcessRecord&) {
-  RaiseNotImplemented("CreateProcess");
+EventJson TimesJson(const platform::FileTimes& t) {
+  return {{"creation", FileTimeText(t.creation)},
+          {"lastAccess", FileTimeText(t.lastAccess)},
+          {"lastWrite", FileTimeText(t.lastWrite)}};
 }
-uint32_t SimProcesses::WaitForInputIdle(int64_t, uint32_t) { RaiseNotImplemented("WaitForInputIdle"); }
-uint32_t SimProcesses::WaitForSingleObject(int64_t, uint32_t) { RaiseNotImplemented("WaitForSingleObject"); }
-bool SimProcesses::GetExitCodeProcess(int64_t, uint32_t&) { RaiseNotImplemented("GetExitCodeProcess"); }
-bool SimProcesses::CloseHandle(int64_t) { RaiseNotImplemented("CloseHandle"); }
-uint32_t SimProcesses::LastError() { RaiseNotImplemented("LastError"); }
+
+std::string DateText(const platform::DateTime& d) {
+  char text[32];
+  std::snprintf(text, sizeof text, "%04d-%02d-%02d %02d:%02d:%02d", d.year, d.month, d.day, d.hour, d.minute,
+                d.second);
+  return text;
+}
+
+}  // namespace
+
+const ErrorDef* RecordingFileSystem::Fault(std::string_view path, std::optional<ErrorDef> FileFaultDef::*call) const {
+  auto it = faults_.files.find(path);
+  if (it == faults_.files.end() || !(it->second.*call)) return nullptr;
+  return &*(it->second.*call);
+}
+
+bool RecordingFileSystem::Inject(EventJson& event, const ErrorDef& error) {
+  injected_ = platform::FileError{error.number, error.description};
+  event["ok"] = false;
+  event["error"] = FileErrorJson(*injected_);
+  event["fault"] = true;
+  return false;
+}
+
+void RecordingFileSystem::Outcome(EventJson& event, bool ok) {
+  event["ok"] = ok;
+  if (!ok) event["error"] = FileErrorJson(inner_.LastError());
+}
+
+const platform::FileError& RecordingFileSystem::LastError() {
+  return injected_ ? *injected_ : inner_.LastError();
+}
+
+std::optional<uint32_t> RecordingFileSystem::GetAttributes(std::string_view path) {
+  injected_.reset();
+  const std::optional<uint32_t> attributes = inner_.GetAttributes(path);
+  EventJson ev{{"ev", "file-attributes"}, {"path", path}, {"attributes", attributes ? EventJson(*attributes) : EventJson()}};
+  if (!attributes) ev["error"] = FileErrorJson(inner_.LastError());
+  log_.Add(std::move(ev));
+  return attributes;
+}
+
+bool RecordingFileSystem::SetAttributes(std::string_view path, uint32_t attributes) {
+  injected_.reset();
+  const bool ok = inner_.SetAttributes(path, attributes);
+  EventJson ev{{"ev", "file-attributes"}, {"path", path}, {"set", attributes}};
+  Outcome(ev, ok);
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+bool RecordingFileSystem::RemoveFile(std::string_view path) {
+  injected_.reset();
+  EventJson ev{{"ev", "file-remove"}, {"path", path}};
+  bool ok = false;
+  if (const ErrorDef* fault = Fault(path, &FileFaultDef::remove)) {
+    Inject(ev, *fault);
+  } else {
+    ok = inner_.RemoveFile(path);
+    Outcome(ev, ok);
+  }
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+bool RecordingFileSystem::MoveFile(std::string_view from, std::string_view to) {
+  injected_.reset();
+  EventJson ev{{"ev", "file-move"}, {"from", from}, {"to", to}};
+  bool ok = false;
+  if (const ErrorDef* fault = Fault(from, &FileFaultDef::move)) {
+    Inject(ev, *fault);
+  } else {
+    ok = inner_.MoveFile(from, to);
+    Outcome(ev, ok);
+  }
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+std::optional<platform::DateTime> RecordingFileSystem::FileDateTime(std::string_view path) {
+  injected_.reset();
+  const std::optional<platform::DateTime> date = inner_.FileDateTime(path);
+  EventJson ev{{"ev", "file-date"}, {"path", path}, {"date", date ? EventJson(DateText(*date)) : EventJson()}};
+  if (!date) ev["error"] = FileErrorJson(inner_.LastError());
+  log_.Add(std::move(ev));
+  return date;
+}
+
+bool RecordingFileSystem::ReplaceText(std::string_view path, std::string_view text) {
+  injected_.reset();
+  EventJson ev{{"ev", "file-replace"}, {"path", path}, {"text", text}};
+  bool ok = false;
+  if (const ErrorDef* fault = Fault(path, &FileFaultDef::replace)) {
+    Inject(ev, *fault);
+  } else {
+    ok = inner_.ReplaceText(path, text);
+    Outcome(ev, ok);
+  }
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+platform::FileHandle RecordingFileSystem::OpenForTimes(std::string_view path) {
+  injected_.reset();
+  EventJson ev{{"ev", "file-times"}, {"call", "open"}, {"path", path}};
+  platform::FileHandle handle = platform::kNoFile;
+  if (const ErrorDef* fault = Fault(path, &FileFaultDef::times)) {
+    Inject(ev, *fault);
+  } else {
+    handle = inner_.OpenForTimes(path);
+    Outcome(ev, handle != platform::kNoFile);
+    if (handle != platform::kNoFile) openPaths_[handle] = std::string(path);
+  }
+  log_.Add(std::move(ev));
+  return handle;
+}
+
+namespace {
+
+// The file a handle stands for, as the log names it.
+EventJson HandlePath(const std::map<platform::FileHandle, std::string>& open, platform::FileHandle file) {
+  auto it = open.find(file);
+  return it == open.end() ? EventJson() : EventJson(it->second);
+}
+
+}  // namespace
+
+bool RecordingFileSystem::GetFileTimes(platform::FileHandle file, platform::FileTimes& times) {
+  injected_.reset();
+  const bool ok = inner_.GetFileTimes(file, times);
+  EventJson ev{{"ev", "file-times"}, {"call", "get"}, {"path", HandlePath(openPaths_, file)}};
+  Outcome(ev, ok);
+  if (ok) ev["times"] = TimesJson(times);
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+bool RecordingFileSystem::SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) {
+  injected_.reset();
+  const bool ok = inner_.SetFileTimes(file, times);
+  EventJson ev{{"ev", "file-times"}, {"call", "set"}, {"path", HandlePath(openPaths_, file)}, {"times", TimesJson(times)}};
+  Outcome(ev, ok);
+  log_.Add(std::move(ev));
+  return ok;
+}
+
+void RecordingFileSystem::CloseFile(platform::FileHandle file) {
+  inner_.CloseFile(file);
+  log_.Add({{"ev", "file-times"}, {"call", "close"}, {"path", HandlePath(openPaths_, file)}});
+  openPaths_.erase(file);
+}
+
+// ---------------------------------------------------------- restore dialog
+
+namespace {
+
+// A row's name in a scenario: a project by its project, a file by its full
+// path (the source path of its restore item, else its folder and name).
+std::string RowName(const platform::RestoreRow& row) {
+  if (row.project) return row.cells[0];
+  std::string_view key = row.key;
+  for (int field = 0; field < 2; ++field) {
+    const size_t bar = key.find('|');
+    if (bar == std::string_view::npos) {
+      key = {};
+      break;
+    }
+    key.remove_prefix(bar + 1);
+  }
+  const std::string source(key.substr(0, key.find('|')));
+  if (!source.empty()) return source;
+  return row.cells[2].empty() ? row.cells[1] : row.cells[2] + "\\" + row.cells[1];
+}
+
+int32_t FindRow(const platform::RestoreForm& form, const std::string& name) {
+  const auto& rows = form.rows();
+  for (size_t i = 0; i < rows.size(); ++i)
+    if (EqualsNoCase(RowName(rows[i]), name)) return static_cast<int32_t>(i);
+  return -1;
+}
+
+EventJson RowsJson(const platform::RestoreForm& form) {
+  EventJson rows = EventJson::array();
+  for (const platform::RestoreRow& r : form.rows()) {
+    EventJson row{{"kind", r.project ? "project" : "file"},
+                  {"cells", EventJson::array({r.cells[0], r.cells[1], r.cells[2]})},
+                  {"check", r.check}};
+    if (!r.project) row["modified"] = r.modified;
+    rows.push_back(std::move(row));
+  }
+  return rows;
+}
+
+// What the window shows, to tell what a step changed.
+struct RestoreState {
+  std::vector<int32_t> checks;
+  std::vector<std::string> names;
+  int32_t selected = -1;
+  std::string title, subtitle;
+  bool ok = false;
+};
+
+RestoreState StateOf(const platform::RestoreForm& form) {
+  RestoreState s;
+  for (const platform::RestoreRow& r : form.rows()) {
+    s.checks.push_back(r.check);
+    s.names.push_back(RowName(r));
+  }
+  s.selected = form.selectedRow();
+  s.title = form.headerTitle();
+  s.subtitle = form.headerSubtitle();
+  s.ok = form.okEnabled();
+  return s;
+}
+
+void AddChanges(EventJson& step, const RestoreState& before, const RestoreState& after) {
+  if (before.names != after.names) {
+    step["rows"] = after.names.size();
+  } else {
+    EventJson checks = EventJson::object();
+    for (size_t i = 0; i < after.checks.size(); ++i)
+      if (after.checks[i] != before.checks[i]) checks[after.names[i]] = after.checks[i];
+    if (!checks.empty()) step["checks"] = std::move(checks);
+  }
+  if (after.selected != before.selected)
+    step["selected"] = after.selected < 0 || static_cast<size_t>(after.selected) >= after.names.size()
+                           ? EventJson()
+                           : EventJson(after.names[static_cast<size_t>(after.selected)]);
+  if (after.title != before.title) step["title"] = after.title;
+  if (after.subtitle != before.subtitle) step["subtitle"] = after.subtitle;
+  if (after.ok != before.ok) step["okEnabled"] = after.ok;
+}
+
+const char* StepName(RestoreStep::Kind kind) {
+  switch (kind) {
+    case RestoreStep::Kind::Tick: return "tick";
+    case RestoreStep::Kind::Untick: return "untick";
+    case RestoreStep::Kind::Select: return "select";
+    case RestoreStep::Kind::Click: return "click";
+    case RestoreStep::Kind::Compare: return "compare";
+    case RestoreStep::Kind::Timer: return "timer";
+    case RestoreStep::Kind::Help: return "help";
+    case RestoreStep::Kind::Ok: return "ok";
+    case RestoreStep::Kind::Cancel: break;
+  }
+  return "cancel";
+}
+
+}  // namespace
+
+void SimUserInterface::WorldFailed(int line, const std::string& reason) {
+  log_.Add({{"ev", "world-failed"}, {"action", "answer"}, {"line", line}, {"reason", reason}});
+}
+
+void SimUserInterface::ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) {
+  const platform::RestoreForm::Texts& texts = form.texts();
+  EventJson ev{{"ev", "restore-dialog"},
+               {"owner", placement.ownerWindow},
+               {"host",
+                {{"top", placement.top}, {"left", placement.left}, {"height", placement.height}, {"width", placement.width}}},
+               {"caption", texts.caption},
+               {"instructions", texts.instructions},
+               {"buttons", EventJson::array({texts.ok, texts.cancel, texts.help})},
+               {"columns", EventJson::array({texts.columns[0], texts.columns[1], texts.columns[2]})},
+               {"title", form.headerTitle()},
+               {"subtitle", form.headerSubtitle()},
+               {"rows", RowsJson(form)},
+               {"okEnabled", form.okEnabled()}};
+  const int32_t selected = form.selectedRow();
+  ev["selected"] = selected >= 0 && static_cast<size_t>(selected) < form.rows().size()
+                       ? EventJson(RowName(form.rows()[static_cast<size_t>(selected)]))
+                       : EventJson();
+  const bool scripted = !restoreAnswers_.empty();
+  RestoreAnswer answer;
+  if (scripted) {
+    answer = std::move(restoreAnswers_.front());
+    restoreAnswers_.pop_front();
+  }
+  EventJson steps = EventJson::array();
+  bool closedByOk = false, closed = false;
+  int32_t menuRow = -1;     // the row whose context menu is open
+  bool timerRunning = false;
+  std::optional<std::pair<int, std::string>> failure;
+  for (const RestoreStep& step : answer.steps) {
+    const RestoreState before = StateOf(form);
+    EventJson record{{"step", StepName(step.kind)}};
+    if (!step.row.empty()) record["row"] = step.row;
+    const int32_t openMenu = menuRow;
+    menuRow = -1;  // any step but the menu's command closes the menu
+    int32_t row = -1;
+    if (!step.row.empty()) {
+      row = FindRow(form, step.row);
+      if (row < 0) failure = {{step.line, "the Restore dialog shows no row \"" + step.row + "\""}};
+    }
+    if (!failure) switch (step.kind) {
+        case RestoreStep::Kind::Tick:
+        case RestoreStep::Kind::Untick:
+          form.SetCheck(row, step.kind == RestoreStep::Kind::Tick);
+          break;
+        case RestoreStep::Kind::Select:
+          form.Select(row);
+          break;
+        case RestoreStep::Kind::Click: {
+          bool startTimer = false;
+          const std::string caption = form.Click(row, startTimer);
+          if (!caption.empty()) {
+            record["menu"] = caption;
+            menuRow = row;
+          }
+          if (startTimer) {
+            record["timerStarted"] = true;
+            timerRunning = true;
+          }
+          break;
+        }
+        case RestoreStep::Kind::Compare:
+          if (openMenu < 0)
+            failure = {{step.line, "no context menu is open to compare from"}};
+          else
+            form.Compare(openMenu);
+          break;
+        case RestoreStep::Kind::Timer:
+          if (!timerRunning) {
+            failure = {{step.line, "no timer runs in the Restore dialog"}};
+          } else {
+            timerRunning = false;
+            form.Timer();
+          }
+          break;
+        case RestoreStep::Kind::Help:
+          form.Help(kRestoreWindow);
+          break;
+        case RestoreStep::Kind::Ok:
+          if (!form.okEnabled()) {
+            failure = {{step.line, "OK is disabled: no file is ticked"}};
+          } else {
+            form.Ok();
+            closed = closedByOk = true;
+          }
+          break;
+        case RestoreStep::Kind::Cancel:
+          form.Cancel();
+          closed = true;
+          break;
+      }
+    if (failure) {
+      record["failed"] = true;
+      steps.push_back(std::move(record));
+      break;
+    }
+    AddChanges(record, before, StateOf(form));
+    steps.push_back(std::move(record));
+    if (closed) break;
+  }
+  // Whatever the play did not close is closed with Cancel: nothing is lost.
+  if (!closed) form.Cancel();
+  ev["steps"] = std::move(steps);
+  ev["pressed"] = closedByOk ? "ok" : "cancel";
+  ev["answered"] = scripted ? "scenario" : "default";
+  log_.Add(std::move(ev));
+  if (failure) WorldFailed(failure->first, failure->second);
+}
+
+platform::DependencyOutcome SimUserInterface::ShowDependencyDialog(const platform::DependencyView& view) {
+  const bool scripted = !dependencyAnswers_.empty();
+  DependencyAnswer answer;  // Cancel, nothing edited
+  if (scripted) {
+    answer = std::move(dependencyAnswers_.front());
+    dependencyAnswers_.pop_front();
+  }
+  platform::DependencyOutcome outcome;
+  outcome.text = view.text;
+  // A read-only text takes no edit.
+  if (answer.text && !view.readOnly) {
+    outcome.changed = true;
+    outcome.text = *answer.text;
+  }
+  const bool okRefused = answer.ok && view.readOnly;
+  outcome.ok = answer.ok && !view.readOnly;
+  EventJson ev{{"ev", "dependency-dialog"},
+               {"caption", view.caption},
+               {"label", view.label},
+               {"text", view.text},
+               {"buttons", EventJson::array({view.ok, view.cancel})},
+               {"readOnly", view.readOnly},
+               {"edited", outcome.changed}};
+  if (outcome.changed) ev["newText"] = outcome.text;
+  ev["pressed"] = outcome.ok ? "ok" : "cancel";
+  ev["answered"] = scripted ? "scenario" : "default";
+  log_.Add(std::move(ev));
+  if (okRefused) WorldFailed(answer.line, "OK is disabled: the module dependency is read-only");
+  return outcome;
+}
+
+// --------------------------------------------------------------- processes
+
+namespace {
+
+// The program a command line starts when no application name is given:
+// its first word, in double quotes or up to the first blank.
+std::string FirstWord(std::string_view line) {
+  while (!line.empty() && (line.front() == ' ' || line.front() == '\t')) line.remove_prefix(1);
+  if (!line.empty() && line.front() == '"') {
+    line.remove_prefix(1);
+    return std::string(line.substr(0, line.find('"')));
+  }
+  return std::string(line.substr(0, line.find_first_of(" \t")));
+}
+
+constexpr uint32_t kErrorFileNotFound = 2;
+constexpr uint32_t kErrorInvalidHandle = 6;
+
+}  // namespace
+
+SimProcesses::Handle* SimProcesses::Find(int64_t handle) {
+  auto it = handles_.find(handle);
+  if (it != handles_.end()) return &it->second;
+  lastError_ = kErrorInvalidHandle;
+  return nullptr;
+}
+
+bool SimProcesses::CreateProcess(std::string_view applicationName, std::string_view commandLine,
+                                 platform::ProcessRecord& record) {
+  const std::string program = applicationName.empty() ? FirstWord(commandLine) : std::string(applicationName);
+  auto def = programs_.find(program);
+  const uint32_t error = def == programs_.end()                            ? kErrorFileNotFound
+                         : def->second.kind == ProcessDef::Kind::StartFails ? def->second.error
+                                                                            : 0;
+  if (error) {
+    lastError_ = error;
+    log_.Add({{"ev", "process"},
+              {"application", applicationName},
+              {"commandLine", commandLine},
+              {"started", false},
+              {"error", error}});
+    return false;
+  }
+  auto child = std::make_shared<Child>();
+  child->application = std::string(applicationName);
+  child->commandLine = std::string(commandLine);
+  child->def = def->second;
+  record.process = nextHandle_++;
+  record.thread = nextHandle_++;
+  record.processId = nextId_++;
+  record.threadId = nextId_++;
+  handles_[record.process] = {child, false};
+  handles_[record.thread] = {child, true};
+  lastError_ = 0;
+  return true;
+}
+
+// Nothing runs, so nothing is ever busy starting up.
+uint32_t SimProcesses::WaitForInputIdle(int64_t process, uint32_t) {
+  const Handle* h = Find(process);
+  if (!h || h->thread) {
+    lastError_ = kErrorInvalidHandle;
+    return platform::kWaitFailed;
+  }
+  return 0;
+}
+
+uint32_t SimProcesses::WaitForSingleObject(int64_t handle, uint32_t milliseconds) {
+  Handle* h = Find(handle);
+  if (!h) return platform::kWaitFailed;
+  Child& child = *h->child;
+  uint32_t result = platform::kWaitObject0;
+  EventJson ev{{"ev", "process"},
+               {"application", child.application},
+               {"commandLine", child.commandLine},
+               {"started", true},
+               {"timeout", milliseconds}};
+  switch (child.def.kind) {
+    case ProcessDef::Kind::Exits:
+      child.waited = true;
+      ev["outcome"] = "exited";
+      ev["exitCode"] = child.def.exitCode;
+      break;
+    case ProcessDef::Kind::TimesOut:
+      result = platform::kWaitTimeout;
+      ev["outcome"] = "timeout";
+      break;
+    case ProcessDef::Kind::WaitFails:
+    case ProcessDef::Kind::StartFails:
+      result = platform::kWaitFailed;
+      lastError_ = child.def.error;
+      ev["outcome"] = "wait-failed";
+      ev["error"] = child.def.error;
+      break;
+  }
+  // One event per process: its first wait on the process handle.
+  if (!h->thread && !child.recorded) {
+    child.recorded = true;
+    log_.Add(std::move(ev));
+  }
+  return result;
+}
+
+bool SimProcesses::GetExitCodeProcess(int64_t process, uint32_t& exitCode) {
+  const Handle* h = Find(process);
+  if (!h || h->thread) {
+    lastError_ = kErrorInvalidHandle;
+    return false;
+  }
+  const Child& child = *h->child;
+  exitCode = child.def.kind == ProcessDef::Kind::Exits ? child.def.exitCode : kStillActive;
+  return true;
+}
+
+bool SimProcesses::CloseHandle(int64_t handle) {
+  Handle* h = Find(handle);
+  if (!h) return false;
+  Child& child = *h->child;
+  if (!h->thread && !child.recorded) {
+    child.recorded = true;
+    log_.Add({{"ev", "process"},
+              {"application", child.application},
+              {"commandLine", child.commandLine},
+              {"started", true},
+              {"waited", false}});
+  }
+  handles_.erase(handle);
+  return true;
+}
 
 }  // namespace kpx::sim

@@ -17,6 +17,7 @@
 #include "shared/shared_debug_logger.h"
 #include "sim/event_log.h"
 #include "sim/model_file.h"
+#include "sim/scenario_file.h"
 
 namespace kpx::sim {
 
@@ -33,6 +34,10 @@ class VirtualClock final : public platform::Clock {
   platform::DateTime Now() override;
   void Sleep(uint32_t milliseconds) override { Advance(milliseconds / 1000.0); }
 
+  // The clock's date and time taken as UTC: the simulated machine lives
+  // in UTC, so a run gives the same file times wherever it runs.
+  std::optional<platform::FileTime> SystemFileTime() override;
+
   double seconds() const { return seconds_; }
 
  private:
@@ -40,7 +45,6 @@ class VirtualClock final : public platform::Clock {
   platform::DateTime date_;
   double seconds_ = 0;
   double step_ = 0;
-  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 class RecordingClock final : public platform::Clock {
@@ -49,11 +53,12 @@ class RecordingClock final : public platform::Clock {
   float Timer() override { return inner_.Timer(); }
   platform::DateTime Now() override { return inner_.Now(); }
   void Sleep(uint32_t milliseconds) override;
+  // Not recorded, as Timer and Now are not: the file times it ends up in are.
+  std::optional<platform::FileTime> SystemFileTime() override { return inner_.SystemFileTime(); }
 
  private:
   platform::Clock& inner_;
   EventLog& log_;
-  std::optional<platform::FileTime> SystemFileTime() override;
 };
 
 // ----------------------------------------------------------- user interface
@@ -95,29 +100,76 @@ class SimUserInterface final : public platform::UserInterface {
 
   platform::PromptOutcome ShowPrompt(const platform::PromptView& view, platform::PromptHelp& help) override;
 
+  void QueueRestoreAnswer(RestoreAnswer answer) { restoreAnswers_.push_back(std::move(answer)); }
+  const std::deque<RestoreAnswer>& pendingRestoreAnswers() const { return restoreAnswers_; }
+  void QueueDependencyAnswer(DependencyAnswer answer) { dependencyAnswers_.push_back(std::move(answer)); }
+  const std::deque<DependencyAnswer>& pendingDependencyAnswers() const { return dependencyAnswers_; }
+  // The window number the played Restore dialog has, as Help hands it on.
+  static constexpr int64_t kRestoreWindow = 4444;
+
   int MessageBox(std::string_view text, std::string_view title, uint32_t style) override;
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
   ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override;
+  // Plays the steps of the next queued answer on the form, then records
+  // the dialog ("restore-dialog"). A step the dialog cannot take (a row it
+  // does not show, a disabled OK, a menu or a timer that is not there)
+  // ends the play: the dialog closes with Cancel and the step is recorded
+  // as "world-failed" with its line. No answer queued: Cancel.
+  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
+  // Takes the next queued answer; none: Cancel. A read-only view takes no
+  // edit, and its OK is disabled.
+  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
 
  private:
+  void WorldFailed(int line, const std::string& reason);
+
   EventLog& log_;
   std::deque<int> answers_;
   std::deque<PromptAnswer> promptAnswers_;
-  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
-  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
+  std::deque<RestoreAnswer> restoreAnswers_;
+  std::deque<DependencyAnswer> dependencyAnswers_;
 };
 
-// Child processes as the model answers them.
+// Child processes as the model answers them: nothing runs. A program is
+// found by the application name, or, without one, by the first word of the
+// command line; one the model does not list cannot be started (error 2).
+// Each start is recorded once ("process"): a failed one at once, a started
+// one at the first wait on its process handle (with the time-out and what
+// the wait gave), or when that handle is closed unwaited.
 class SimProcesses final : public platform::Processes {
  public:
+  SimProcesses(EventLog& log, const std::map<std::string, ProcessDef, NoCaseLess>& programs)
+      : log_(log), programs_(programs) {}
   bool CreateProcess(std::string_view applicationName, std::string_view commandLine,
                      platform::ProcessRecord& record) override;
   uint32_t WaitForInputIdle(int64_t process, uint32_t milliseconds) override;
   uint32_t WaitForSingleObject(int64_t handle, uint32_t milliseconds) override;
   bool GetExitCodeProcess(int64_t process, uint32_t& exitCode) override;
   bool CloseHandle(int64_t handle) override;
-  uint32_t LastError() override;
+  uint32_t LastError() override { return lastError_; }
+
+  static constexpr uint32_t kStillActive = 259;
+
+ private:
+  struct Child {
+    std::string application, commandLine;
+    ProcessDef def;
+    bool recorded = false;
+    bool waited = false;  // a wait saw it end
+  };
+  struct Handle {
+    std::shared_ptr<Child> child;
+    bool thread = false;
+  };
+  Handle* Find(int64_t handle);
+
+  EventLog& log_;
+  const std::map<std::string, ProcessDef, NoCaseLess>& programs_;
+  std::map<int64_t, Handle> handles_;
+  int64_t nextHandle_ = 0x1000;
+  uint32_t nextId_ = 4000;
+  uint32_t lastError_ = 0;
 };
 
 // ---------------------------------------------------------------- registry
@@ -175,10 +227,14 @@ class DebugLogLocator {
   DebugLogger logger_;
 };
 
+// Records every call. Where the model's file faults name the file, a
+// remove, move, replace or open for times fails with the fault's error
+// without reaching the file system, and its event says so ("fault": true).
 class RecordingFileSystem final : public platform::FileSystem {
  public:
-  RecordingFileSystem(platform::FileSystem& inner, EventLog& log, DebugLogLocator& debugLog)
-      : inner_(inner), log_(log), debugLog_(debugLog) {}
+  RecordingFileSystem(platform::FileSystem& inner, EventLog& log, DebugLogLocator& debugLog,
+                      const FaultsDef& faults)
+      : inner_(inner), log_(log), debugLog_(debugLog), faults_(faults) {}
   bool Exists(std::string_view path) override;
   bool DeleteFile(std::string_view path) override;
   bool AppendComposed(std::string_view path, const std::function<std::string()>& compose) override;
@@ -186,10 +242,6 @@ class RecordingFileSystem final : public platform::FileSystem {
   // the text: the model file already shows what the file holds.
   std::string ReadText(std::string_view path) override;
 
- private:
-  platform::FileSystem& inner_;
-  EventLog& log_;
-  DebugLogLocator& debugLog_;
   std::optional<uint32_t> GetAttributes(std::string_view path) override;
   bool SetAttributes(std::string_view path, uint32_t attributes) override;
   bool RemoveFile(std::string_view path) override;
@@ -201,6 +253,21 @@ class RecordingFileSystem final : public platform::FileSystem {
   bool SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) override;
   void CloseFile(platform::FileHandle file) override;
   const platform::FileError& LastError() override;
+
+ private:
+  // The fault of `path` for one kind of call; nothing when there is none.
+  const ErrorDef* Fault(std::string_view path, std::optional<ErrorDef> FileFaultDef::*call) const;
+  // Fails the call with the fault's error; returns false.
+  bool Inject(EventJson& event, const ErrorDef& error);
+  // Adds the call's outcome, and its error when it failed.
+  void Outcome(EventJson& event, bool ok);
+
+  platform::FileSystem& inner_;
+  EventLog& log_;
+  DebugLogLocator& debugLog_;
+  const FaultsDef& faults_;
+  std::optional<platform::FileError> injected_;  // the last call's error came from a fault
+  std::map<platform::FileHandle, std::string> openPaths_;
 };
 
 // Lays out the model's folders and files before the run. The platform's

@@ -64,11 +64,12 @@ Simulation::Simulation(const ModelDef& model, Environment environment, AddInFact
       env_(environment),
       world_(model, log_),
       ui_(log_),
+      processes_(log_, model.processes),
       factory_(world_),
       faultyRegistry_(env_.registry, model.faults),
       debugLog_(platform::Platform{faultyRegistry_, env_.files, clock_, factory_, ui_, processes_}),
       registry_(env_.registry, log_, model.faults),
-      files_(env_.files, log_, debugLog_),
+      files_(env_.files, log_, debugLog_, model.faults),
       recordingClock_(clock_, log_),
       objects_(factory_, log_),
       platform_{registry_, files_, recordingClock_, objects_, ui_, processes_},
@@ -94,8 +95,32 @@ void Simulation::Prepare() {
   // root ("C:\tzndebuglog.txt", the logger's default) can be written.
   env_.seeder.MakeFolder("C:\\");
   for (const std::string& folder : model_.folders) env_.seeder.MakeFolder(folder);
-  for (const auto& [path, content] : model_.files) env_.seeder.WriteFile(path, content);
   clock_.Set(model_.clock);
+  const platform::FileTime start = *clock_.SystemFileTime();
+  for (const auto& [path, content] : model_.files) {
+    env_.seeder.WriteFile(path, content);
+    auto detail = model_.fileDetails.find(path);
+    StampFile(path, detail == model_.fileDetails.end() ? FileDetailDef{} : detail->second, start);
+  }
+}
+
+// A file the world lays out has the times the model gives it, the others
+// the clock's present time, so that a run is the same wherever and
+// whenever it runs; a read-only file is made read-only last, once its times
+// are set.
+void Simulation::StampFile(const std::string& path, const FileDetailDef& detail, platform::FileTime now) {
+  platform::FileSystem& files = env_.files;
+  const platform::FileHandle handle = files.OpenForTimes(path);
+  if (handle == platform::kNoFile)
+    throw WorldError("cannot set the times of " + path + ": " + files.LastError().description);
+  const platform::FileTimes times{detail.creation.value_or(now), detail.lastAccess.value_or(now),
+                                  detail.lastWrite.value_or(now)};
+  const bool set = files.SetFileTimes(handle, times);
+  files.CloseFile(handle);
+  if (!set) throw WorldError("cannot set the times of " + path + ": " + files.LastError().description);
+  if (detail.readOnly &&
+      !files.SetAttributes(path, platform::kAttributeReadOnly | platform::kAttributeArchive))
+    throw WorldError("cannot make " + path + " read-only: " + files.LastError().description);
 }
 
 void Simulation::SeedRegistry(const std::vector<RegistryEntry>& entries) {
@@ -123,6 +148,10 @@ void Simulation::Run(const Scenario& scenario) {
               {"buttons", EventJson(std::vector<int>(ui_.pendingAnswers().begin(), ui_.pendingAnswers().end()))}});
   if (!ui_.pendingPromptAnswers().empty())
     log_.Add({{"ev", "unused-answers"}, {"prompts", ui_.pendingPromptAnswers().size()}});
+  if (!ui_.pendingRestoreAnswers().empty())
+    log_.Add({{"ev", "unused-answers"}, {"restoreDialogs", ui_.pendingRestoreAnswers().size()}});
+  if (!ui_.pendingDependencyAnswers().empty())
+    log_.Add({{"ev", "unused-answers"}, {"dependencyDialogs", ui_.pendingDependencyAnswers().size()}});
 }
 
 void Simulation::Create() {
@@ -182,6 +211,10 @@ void Simulation::Apply(const Action& a) {
     case Action::Type::Answer:
       if (a.prompt)
         ui_.QueuePromptAnswer({*a.prompt, a.promptHelp});
+      else if (a.restore)
+        ui_.QueueRestoreAnswer(*a.restore);
+      else if (a.dependency)
+        ui_.QueueDependencyAnswer(*a.dependency);
       else
         ui_.QueueAnswer(a.answer);
       logWorld("answer");
@@ -202,9 +235,10 @@ void Simulation::Apply(const Action& a) {
     case Action::Type::SetFile:
       for (const auto& [path, content] : a.files) {
         try {
-          if (content)
+          if (content) {
             env_.seeder.WriteFile(path, *content);
-          else
+            StampFile(path, {}, *clock_.SystemFileTime());
+          } else
             env_.seeder.RemoveFile(path);
         } catch (const WorldError& e) {
           refused.push_back(e.what());

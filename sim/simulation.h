@@ -86,6 +86,8 @@ class Simulation {
   // itself is shown by its contents where it is a collection.
   EventJson ResultValue(const Variant& result);
   void SeedRegistry(const std::vector<RegistryEntry>& entries);
+  // Sets a laid-out file's times and attributes. Raises WorldError.
+  void StampFile(const std::string& path, const FileDetailDef& detail, platform::FileTime now);
   void MakeObject(const Action& action);
   void Use(const Action& action);
 

@@ -57,7 +57,7 @@ class SimWorld {
  public:
   explicit SimWorld(const std::string& modelText)
       : model_(ParseModel(modelText)),
-        files_(dir_.path()),
+        files_(dir_.path(), posix::SandboxFileSystem::Zone::Utc),
         seeder_([this](std::string_view p) { return files_.HostPath(p); }),
         sim_(model_, Environment{registry_, files_, seeder_}) {
     sim_.Prepare();
