@@ -215,7 +215,7 @@ void ActionsGoToTheForm(HMODULE addin) {
   std::vector<int> afterProjectTick, afterFileUntick, afterPartialTick;
   bool okAfterTick = false, okAfterUntick = true;
   std::string titleAfterSelect, subtitleAfterSelect, menuText;
-  bool menuShown = false, timerBeforeSecond = true, timerAfter = false;
+  bool menuShown = false, keyboardMenu = false, timerBeforeSecond = true, timerAfter = false;
   size_t callsBeforeHelp = 0;
   WindowUser user(ShownRestoreWindows, [&](HWND dialog) {
     TickRow(dialog, 0, true);  // "Shapes" and its two files
@@ -256,6 +256,15 @@ void ActionsGoToTheForm(HMODULE addin) {
       ChoosePopupCommand(menu, false);
       WaitFor([&] { return WaitForPopupMenu(0) == nullptr; });
     }
+    // The menu key on a selected file row opens its menu too.
+    SelectRow(dialog, 2);
+    PostMessageW(dialog, WM_CONTEXTMENU, reinterpret_cast<WPARAM>(GetDlgItem(dialog, KPX_RESTORE_LIST)), -1);
+    menu = WaitForPopupMenu(2000);
+    keyboardMenu = menu != nullptr;
+    if (menu) {
+      ChoosePopupCommand(menu, true);
+      WaitFor([&] { return Called(form, "compare 2"); });
+    }
     callsBeforeHelp = form.calls.size();
     Press(dialog, IDHELP);
     // OK is disabled: Enter does nothing; a tick enables it, and OK closes.
@@ -279,6 +288,8 @@ void ActionsGoToTheForm(HMODULE addin) {
   CHECK(menuShown);
   CHECK_EQ(menuText, form.compareCaption);
   CHECK(Called(form, "compare 4"));
+  CHECK(keyboardMenu);
+  CHECK(Called(form, "compare 2"));
   CHECK(Called(form, "click 6"));
   CHECK(!Called(form, "compare 6"));
   CHECK(!Called(form, "click 7"));

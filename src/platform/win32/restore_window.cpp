@@ -333,12 +333,20 @@ void StartTimerIf(HWND dialog, bool start) {
 }
 
 // The file row's context menu, with the one command the form named, at the
-// mouse; the command chosen compares the file with its backup.
-void ContextMenu(HWND dialog, RestoreState& state, int row, const std::string& caption) {
+// mouse (or under the row, from the keyboard); the command chosen compares
+// the file with its backup.
+void ContextMenu(HWND dialog, RestoreState& state, int row, const std::string& caption, bool keyboard) {
   HMENU menu = CreatePopupMenu();
   AppendMenuW(menu, MF_STRING, KPX_RESTORE_COMPARE, Utf8ToWide(caption).c_str());
   POINT at;
   GetCursorPos(&at);
+  RECT cell = {};
+  cell.top = 1;
+  cell.left = LVIR_LABEL;
+  if (keyboard && SendMessageW(List(dialog), LVM_GETSUBITEMRECT, static_cast<WPARAM>(row), reinterpret_cast<LPARAM>(&cell))) {
+    at = {cell.left, cell.bottom};
+    ClientToScreen(List(dialog), &at);
+  }
   const UINT chosen = static_cast<UINT>(
       TrackPopupMenu(menu, TPM_RETURNCMD | TPM_RIGHTBUTTON | TPM_NONOTIFY, at.x, at.y, 0, dialog, nullptr));
   DestroyMenu(menu);
@@ -361,9 +369,9 @@ void OnItemChanged(HWND dialog, RestoreState& state, const NMLISTVIEW& change) {
     Act(dialog, state, [&] { state.form.Select(row); });
 }
 
-void OnClick(HWND dialog, RestoreState& state, const NMITEMACTIVATE& click, bool right) {
-  HWND list = List(dialog);
-  const int row = RowAt(list, click.ptAction);
+// A click on `row`, left or right; `keyboard`: the menu key (or Shift+F10)
+// on the selected row, which stands for a right click.
+void OnClick(HWND dialog, RestoreState& state, int row, bool right, bool keyboard = false) {
   if (!IsRow(state, row)) return;
   const bool project = state.form.rows()[static_cast<size_t>(row)].project;
   // A left click counts on a project row, a right click opens a file row's menu.
@@ -372,7 +380,7 @@ void OnClick(HWND dialog, RestoreState& state, const NMITEMACTIVATE& click, bool
   bool startTimer = false;
   Act(dialog, state, [&] { caption = state.form.Click(row, startTimer); });
   if (!state.failure) StartTimerIf(dialog, startTimer);
-  if (right && !state.failure && !caption.empty()) ContextMenu(dialog, state, row, caption);
+  if (right && !state.failure && !caption.empty()) ContextMenu(dialog, state, row, caption, keyboard);
 }
 
 void OnCommand(HWND dialog, RestoreState& state, int id) {
@@ -493,10 +501,9 @@ INT_PTR CALLBACK RestoreProc(HWND dialog, UINT message, WPARAM wParam, LPARAM lP
           OnItemChanged(dialog, *state, *reinterpret_cast<const NMLISTVIEW*>(lParam));
           break;
         case NM_CLICK:
-          OnClick(dialog, *state, *reinterpret_cast<const NMITEMACTIVATE*>(lParam), false);
-          break;
         case NM_RCLICK:
-          OnClick(dialog, *state, *reinterpret_cast<const NMITEMACTIVATE*>(lParam), true);
+          OnClick(dialog, *state, RowAt(List(dialog), reinterpret_cast<const NMITEMACTIVATE*>(lParam)->ptAction),
+                  header.code == NM_RCLICK);
           break;
       }
       return FALSE;
@@ -512,6 +519,11 @@ INT_PTR CALLBACK RestoreProc(HWND dialog, UINT message, WPARAM wParam, LPARAM lP
       return TRUE;
     case WM_HELP:
       OnCommand(dialog, *state, IDHELP);
+      return TRUE;
+    case WM_CONTEXTMENU:
+      // From the mouse the list's right click has done it all already.
+      if (reinterpret_cast<HWND>(wParam) != List(dialog) || lParam != -1) return FALSE;
+      OnClick(dialog, *state, ListView_GetNextItem(List(dialog), -1, LVNI_SELECTED), true, true);
       return TRUE;
   }
   return FALSE;

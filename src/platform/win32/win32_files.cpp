@@ -34,6 +34,8 @@ platform::FileError Win32FileSystem::ErrorFromSystem(DWORD code) {
     case ERROR_LOCK_VIOLATION: number = vberr::kPermissionDenied; break;
     case ERROR_FILE_EXISTS:
     case ERROR_ALREADY_EXISTS: number = vberr::kFileAlreadyExists; break;
+    case ERROR_HANDLE_DISK_FULL:
+    case ERROR_DISK_FULL: number = vberr::kDiskFull; break;
     default: break;
   }
   return {number, VbErrorDescription(number)};
