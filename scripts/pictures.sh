@@ -1,5 +1,5 @@
 #!/usr/bin/env bash
-# The prompt window's pictures in docs/pictures/, taken from the real x64
+# The add-in's windows' pictures in docs/pictures/, taken from the real x64
 # kpxaddin.dll under Wine on a 24-bit screen of its own (Xvfb). The
 # resource component is registered for the run, as the prompt's captions
 # come from it, and unregistered after.

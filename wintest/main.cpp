@@ -36,7 +36,9 @@
 #include "platform/win32/win32_strings.h"
 #include "shared/resource_strings.h"
 #include "shared/resource_texts.h"
+#include "platform_tests.h"
 #include "render.h"
+#include "restore_window_tests.h"
 #include "shared/shared_registryapi2.h"
 #include "system.h"
 
@@ -64,6 +66,14 @@ std::wstring Text(int32_t id) {
 }
 
 std::wstring Guid(const GUID& g) { return kpx::win32::GuidToWide(g); }
+
+// The folder this program was started from (the child program of the process tests lies there).
+std::string ProgramFolder() {
+  wchar_t path[MAX_PATH] = {};
+  GetModuleFileNameW(nullptr, path, MAX_PATH);
+  std::wstring folder(path);
+  return Narrow(folder.substr(0, folder.find_last_of(L'\\')));
+}
 
 std::vector<std::wstring> AddInKeys() {
   return {L"CLSID\\" + Guid(CLSID_API),           L"CLSID\\" + Guid(CLSID_TokenScanner),
@@ -1110,14 +1120,18 @@ int main(int argc, char** argv) {
   BridgeAgainstHostObjects();
   ObservedServing();
   PlatformOverWin32(paths, addin);
+  FileMembersTests(Narrow(paths.scratch));
+  ProcessMembersTests(ProgramFolder() + "\\kpx-child.exe");
   CodeIcons();
   // A window needs a screen (run.sh gives the run one).
   if (!addin)
     std::printf("prompt window: not tested, kpxaddin.dll did not load\n");
   else if (GetEnvironmentVariableW(L"DISPLAY", nullptr, 0) == 0)
     std::printf("prompt window: not tested, there is no display (DISPLAY)\n");
-  else
+  else {
     PromptWindowTests(addin);
+    RestoreWindowTests(addin, Narrow(paths.scratch));
+  }
   if (addin) ReferencesAndUnloading(addin);
   ResourceComponentMissing(paths);
 

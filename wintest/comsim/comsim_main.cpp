@@ -274,6 +274,15 @@ int Main(int argc, char** argv) {
     return 3;
   }
 
+  // The Restore dialog's steps (clicks, the comparison menu, the timer) are
+  // not played on the real window yet.
+  for (const Action& a : scenario.actions) {
+    if (a.type == Action::Type::Answer && a.restore) {
+      std::printf("  skipped: the scenario works the Restore dialog, which is not played on the real window yet\n");
+      return 3;
+    }
+  }
+
   const auto trees = TreesOf(model, scenario);
   RemoveTrees(trees);
   RemoveJournaled();

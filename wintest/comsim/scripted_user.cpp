@@ -8,6 +8,7 @@
 
 #include "platform/win32/prompt_window_ids.h"
 #include "prompt_reader.h"
+#include "restore_reader.h"
 
 namespace wintest {
 
@@ -149,6 +150,10 @@ void ScriptedUser::Answer(HWND box) {
     AnswerPrompt(box);
     return;
   }
+  if (IsDependencyWindow(box)) {
+    AnswerDependency(box);
+    return;
+  }
   const int button = answers_.MessageBox(MessageOf(box), WindowText(box), ButtonsOf(box));
   // What a click on the button sends; the box ends with that id.
   PostMessageW(box, WM_COMMAND, MAKEWPARAM(button, BN_CLICKED), reinterpret_cast<LPARAM>(GetDlgItem(box, button)));
@@ -164,6 +169,22 @@ void ScriptedUser::AnswerPrompt(HWND prompt) {
   if (!IsWindow(prompt)) return;
   if (outcome.dontShow) Click(prompt, KPX_PROMPT_DONT_SHOW);
   Click(prompt, outcome.cancelled ? IDCANCEL : IDOK);
+}
+
+// The module dependency dialog as the simulator sees it, read off the
+// window; the scenario's edit typed in, then OK or Cancel pressed.
+void ScriptedUser::AnswerDependency(HWND dialog) {
+  const DependencySeen seen = ReadDependency(dialog);
+  kpx::platform::DependencyView view;
+  view.caption = seen.caption;
+  view.label = seen.label;
+  view.text = seen.text;
+  view.ok = seen.ok;
+  view.cancel = seen.cancel;
+  view.readOnly = seen.readOnly;
+  const kpx::platform::DependencyOutcome outcome = answers_.ShowDependencyDialog(view);
+  if (outcome.changed) TypeDependencyText(dialog, outcome.text);
+  Click(dialog, outcome.ok ? IDOK : IDCANCEL);
 }
 
 int ScriptedUser::EndChildren() {

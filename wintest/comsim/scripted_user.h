@@ -1,7 +1,8 @@
 // The user at the test host's screen, as the native run scripts it: the
 // add-in's real message boxes are answered with the buttons the scenario
 // queued (OK when none is left), its prompts with the queued prompt answers
-// (Help, the tick, OK or Cancel), and whatever the add-in started on the way
+// (Help, the tick, OK or Cancel), its module dependency dialog with the
+// queued edit and button, and whatever the add-in started on the way
 // (the help viewer) is ended after the run.
 #pragma once
 
@@ -32,6 +33,7 @@ class ScriptedUser {
   static DWORD WINAPI Watch(void* self);
   void Answer(HWND box);
   void AnswerPrompt(HWND prompt);
+  void AnswerDependency(HWND dialog);
 
   kpx::platform::UserInterface& answers_;
   HWND window_ = nullptr;   // message-only, on the add-in's thread

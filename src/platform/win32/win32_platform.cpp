@@ -3,7 +3,9 @@
 #include "automation/automation_error.h"
 #include "platform/win32/com_errors.h"
 #include "platform/win32/dispatch_object.h"
+#include "platform/win32/dependency_window.h"
 #include "platform/win32/prompt_window.h"
+#include "platform/win32/restore_window.h"
 #include "platform/win32/win32_strings.h"
 #include "shared/resource_strings.h"
 
@@ -274,34 +276,12 @@ void Win32UserInterface::DoEvents() {
 }
 
 
-// Not there yet on this platform.
-std::optional<uint32_t> Win32FileSystem::GetAttributes(std::string_view) { RaiseNotImplemented("GetAttributes"); }
-bool Win32FileSystem::SetAttributes(std::string_view, uint32_t) { RaiseNotImplemented("SetAttributes"); }
-bool Win32FileSystem::RemoveFile(std::string_view) { RaiseNotImplemented("RemoveFile"); }
-bool Win32FileSystem::MoveFile(std::string_view, std::string_view) { RaiseNotImplemented("MoveFile"); }
-std::optional<platform::DateTime> Win32FileSystem::FileDateTime(std::string_view) { RaiseNotImplemented("FileDateTime"); }
-bool Win32FileSystem::ReplaceText(std::string_view, std::string_view) { RaiseNotImplemented("ReplaceText"); }
-platform::FileHandle Win32FileSystem::OpenForTimes(std::string_view) { RaiseNotImplemented("OpenForTimes"); }
-bool Win32FileSystem::GetFileTimes(platform::FileHandle, platform::FileTimes&) { RaiseNotImplemented("GetFileTimes"); }
-bool Win32FileSystem::SetFileTimes(platform::FileHandle, const platform::FileTimes&) { RaiseNotImplemented("SetFileTimes"); }
-void Win32FileSystem::CloseFile(platform::FileHandle) { RaiseNotImplemented("CloseFile"); }
-const platform::FileError& Win32FileSystem::LastError() { RaiseNotImplemented("LastError"); }
-std::optional<platform::FileTime> Win32Clock::SystemFileTime() { RaiseNotImplemented("SystemFileTime"); }
-void Win32UserInterface::ShowRestoreDialog(platform::RestoreForm&, const platform::HostPlacement&) {
-  RaiseNotImplemented("ShowRestoreDialog");
-}
-platform::DependencyOutcome Win32UserInterface::ShowDependencyDialog(const platform::DependencyView&) {
-  RaiseNotImplemented("ShowDependencyDialog");
+void Win32UserInterface::ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) {
+  ShowRestoreWindow(resources_, form, placement);
 }
 
-
-bool Win32Processes::CreateProcess(std::string_view, std::string_view, platform::ProcessRecord&) {
-  RaiseNotImplemented("CreateProcess");
+platform::DependencyOutcome Win32UserInterface::ShowDependencyDialog(const platform::DependencyView& view) {
+  return ShowDependencyWindow(resources_, GetActiveWindow(), view);
 }
-uint32_t Win32Processes::WaitForInputIdle(int64_t, uint32_t) { RaiseNotImplemented("WaitForInputIdle"); }
-uint32_t Win32Processes::WaitForSingleObject(int64_t, uint32_t) { RaiseNotImplemented("WaitForSingleObject"); }
-bool Win32Processes::GetExitCodeProcess(int64_t, uint32_t&) { RaiseNotImplemented("GetExitCodeProcess"); }
-bool Win32Processes::CloseHandle(int64_t) { RaiseNotImplemented("CloseHandle"); }
-uint32_t Win32Processes::LastError() { RaiseNotImplemented("LastError"); }
 
 }  // namespace kpx::win32

@@ -37,7 +37,16 @@ class Win32FileSystem final : public platform::FileSystem {
   bool GetFileTimes(platform::FileHandle file, platform::FileTimes& times) override;
   bool SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) override;
   void CloseFile(platform::FileHandle file) override;
-  const platform::FileError& LastError() override;
+  const platform::FileError& LastError() override { return lastError_; }
+
+  // The VB error a system error code stands for, as the file statements
+  // raise it.
+  static platform::FileError ErrorFromSystem(DWORD code);
+
+ private:
+  // Records the calling thread's last system error; returns false.
+  bool Failed();
+  platform::FileError lastError_;
 };
 
 class Win32Clock final : public platform::Clock {
@@ -74,12 +83,12 @@ class Win32UserInterface final : public platform::UserInterface {
   bool WinHelp(int64_t window, std::string_view helpFile, uint32_t command, uint64_t data) override;
   void DoEvents() override;
   ObjectPtr LoadIconPicture(int32_t resourceId, int32_t pixels) override;
+  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
+  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
 
  private:
   ComBridge& bridge_;
   HINSTANCE resources_;
-  void ShowRestoreDialog(platform::RestoreForm& form, const platform::HostPlacement& placement) override;
-  platform::DependencyOutcome ShowDependencyDialog(const platform::DependencyView& view) override;
 };
 
 // Child processes through kernel32.
