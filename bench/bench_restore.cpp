@@ -5,6 +5,7 @@
 
 #include <filesystem>
 #include <fstream>
+#include <optional>
 
 #include "fakes.h"
 #include "platform/posix/posix_platform.h"
@@ -36,6 +37,8 @@ struct RestoreWorld {
     platform = std::make_unique<platform::Platform>(
         platform::Platform{world.registry, *files, world.clock, world.factory, world.ui, world.processes});
     module = std::make_unique<Module>(*platform);
+    world.texts[5028] = "Backups";
+    world.texts[5029] = "Backup";
     module->resources().InitResourceStrings();
     world.ui.defaultAnswer = 6;  // Yes
     world.ui.playRestore = [](platform::RestoreForm& form) {
@@ -55,7 +58,7 @@ struct RestoreWorld {
     vc->On(hostid::kAddInName, "Name", [](Args) -> Variant { return "VC++"; })
         .On(hostid::kReadSetting, "ReadSetting", [this](Args a) -> Variant {
           auto it = settings.find(a[1].toString());
-          return a[0].toString() == "T5028" && it != settings.end() ? Variant(it->second) : a[2].deref();
+          return a[0].toString() == "Backups" && it != settings.end() ? Variant(it->second) : a[2].deref();
         })
         .On(hostid::kWriteSetting, "WriteSetting", nullptr);
   }
@@ -73,14 +76,15 @@ struct RestoreWorld {
 
 void BM_RestoreEverything(benchmark::State& state) {
   const int perProject = static_cast<int>(state.range(0));
+  std::optional<RestoreWorld> world;
   for (auto _ : state) {
     state.PauseTiming();
-    RestoreWorld world(perProject);
+    world.reset();
+    world.emplace(perProject);
     state.ResumeTiming();
-    RestoreSource(*world.module).RestoreSourceFiles(world.app);
-    state.PauseTiming();
-    if (std::filesystem::exists(world.sandbox / "C" / "P0" / "Backup" / "P0.lst")) state.SkipWithError("not restored");
+    RestoreSource(*world->module).RestoreSourceFiles(world->app);
   }
+  if (std::filesystem::exists(world->sandbox / "C" / "P0" / "Backup" / "P0.lst")) state.SkipWithError("not restored");
   state.counters["files"] = RestoreWorld::kProjects * perProject;
   state.counters["files/s"] =
       benchmark::Counter(RestoreWorld::kProjects * perProject, benchmark::Counter::kIsIterationInvariantRate);

@@ -454,17 +454,26 @@ const ErrorDef* RecordingFileSystem::Fault(std::string_view path, std::optional<
   return &*(it->second.*call);
 }
 
-bool RecordingFileSystem::Inject(EventJson& event, const ErrorDef& error) {
-  injected_ = platform::FileError{error.number, error.description};
-  event["ok"] = false;
-  event["error"] = FileErrorJson(*injected_);
-  event["fault"] = true;
-  return false;
-}
-
 void RecordingFileSystem::Outcome(EventJson& event, bool ok) {
   event["ok"] = ok;
   if (!ok) event["error"] = FileErrorJson(inner_.LastError());
+}
+
+bool RecordingFileSystem::Faultable(EventJson event, std::string_view path,
+                                    std::optional<ErrorDef> FileFaultDef::*kind, const std::function<bool()>& call) {
+  injected_.reset();
+  bool ok = false;
+  if (const ErrorDef* fault = Fault(path, kind)) {
+    injected_ = platform::FileError{fault->number, fault->description};
+    event["ok"] = false;
+    event["error"] = FileErrorJson(*injected_);
+    event["fault"] = true;
+  } else {
+    ok = call();
+    Outcome(event, ok);
+  }
+  log_.Add(std::move(event));
+  return ok;
 }
 
 const platform::FileError& RecordingFileSystem::LastError() {
@@ -490,31 +499,13 @@ bool RecordingFileSystem::SetAttributes(std::string_view path, uint32_t attribut
 }
 
 bool RecordingFileSystem::RemoveFile(std::string_view path) {
-  injected_.reset();
-  EventJson ev{{"ev", "file-remove"}, {"path", path}};
-  bool ok = false;
-  if (const ErrorDef* fault = Fault(path, &FileFaultDef::remove)) {
-    Inject(ev, *fault);
-  } else {
-    ok = inner_.RemoveFile(path);
-    Outcome(ev, ok);
-  }
-  log_.Add(std::move(ev));
-  return ok;
+  return Faultable({{"ev", "file-remove"}, {"path", path}}, path, &FileFaultDef::remove,
+                   [&] { return inner_.RemoveFile(path); });
 }
 
 bool RecordingFileSystem::MoveFile(std::string_view from, std::string_view to) {
-  injected_.reset();
-  EventJson ev{{"ev", "file-move"}, {"from", from}, {"to", to}};
-  bool ok = false;
-  if (const ErrorDef* fault = Fault(from, &FileFaultDef::move)) {
-    Inject(ev, *fault);
-  } else {
-    ok = inner_.MoveFile(from, to);
-    Outcome(ev, ok);
-  }
-  log_.Add(std::move(ev));
-  return ok;
+  return Faultable({{"ev", "file-move"}, {"from", from}, {"to", to}}, from, &FileFaultDef::move,
+                   [&] { return inner_.MoveFile(from, to); });
 }
 
 std::optional<platform::DateTime> RecordingFileSystem::FileDateTime(std::string_view path) {
@@ -527,31 +518,17 @@ std::optional<platform::DateTime> RecordingFileSystem::FileDateTime(std::string_
 }
 
 bool RecordingFileSystem::ReplaceText(std::string_view path, std::string_view text) {
-  injected_.reset();
-  EventJson ev{{"ev", "file-replace"}, {"path", path}, {"text", text}};
-  bool ok = false;
-  if (const ErrorDef* fault = Fault(path, &FileFaultDef::replace)) {
-    Inject(ev, *fault);
-  } else {
-    ok = inner_.ReplaceText(path, text);
-    Outcome(ev, ok);
-  }
-  log_.Add(std::move(ev));
-  return ok;
+  return Faultable({{"ev", "file-replace"}, {"path", path}, {"text", text}}, path, &FileFaultDef::replace,
+                   [&] { return inner_.ReplaceText(path, text); });
 }
 
 platform::FileHandle RecordingFileSystem::OpenForTimes(std::string_view path) {
-  injected_.reset();
-  EventJson ev{{"ev", "file-times"}, {"call", "open"}, {"path", path}};
   platform::FileHandle handle = platform::kNoFile;
-  if (const ErrorDef* fault = Fault(path, &FileFaultDef::times)) {
-    Inject(ev, *fault);
-  } else {
+  Faultable({{"ev", "file-times"}, {"call", "open"}, {"path", path}}, path, &FileFaultDef::times, [&] {
     handle = inner_.OpenForTimes(path);
-    Outcome(ev, handle != platform::kNoFile);
     if (handle != platform::kNoFile) openPaths_[handle] = std::string(path);
-  }
-  log_.Add(std::move(ev));
+    return handle != platform::kNoFile;
+  });
   return handle;
 }
 

@@ -257,10 +257,12 @@ class RecordingFileSystem final : public platform::FileSystem {
  private:
   // The fault of `path` for one kind of call; nothing when there is none.
   const ErrorDef* Fault(std::string_view path, std::optional<ErrorDef> FileFaultDef::*call) const;
-  // Fails the call with the fault's error; returns false.
-  bool Inject(EventJson& event, const ErrorDef& error);
   // Adds the call's outcome, and its error when it failed.
   void Outcome(EventJson& event, bool ok);
+  // Runs `call` unless the model makes this kind of call on `path` fail
+  // (the fault's error then answers), and logs `event` with the outcome.
+  bool Faultable(EventJson event, std::string_view path, std::optional<ErrorDef> FileFaultDef::*kind,
+                 const std::function<bool()>& call);
 
   platform::FileSystem& inner_;
   EventLog& log_;

@@ -3,7 +3,6 @@
 // command form, and the restore's bookkeeping when files fail half-way.
 #include <gtest/gtest.h>
 
-#include "dialogs/kpx_property_spec.h"
 #include "fakes.h"
 #include "restore/difference_tool.h"
 #include "restore/kpx_restore_form.h"
@@ -345,49 +344,6 @@ TEST_F(RestoreTest, RestoringAWholeProjectMovesBackupsDropsItsRecordAndClosesThe
   EXPECT_EQ(world.ui.placements[0].width, 800);
 }
 
-TEST_F(RestoreTest, APartialRestoreKeepsUnrestoredLinesWholeAndInTheDialogsOrder) {
-  Record(1, Project("p", {"a.cpp", "ro.cpp", "b.cpp", "locked.cpp", "gone.cpp"}));
-  world.files.attributes["c:\\p\\ro.cpp"] = platform::kAttributeReadOnly;
-  world.files.undeletable.insert("c:\\p\\locked.cpp");
-  world.files.Forget("c:\\p\\backup\\gone.cpp.bak");
-  Tick({"C:\\p\\a.cpp", "C:\\p\\ro.cpp", "C:\\p\\locked.cpp"});
-
-  RestoreSource(module).RestoreSourceFiles(app);
-
-  EXPECT_EQ(world.files.at("C:\\p\\a.cpp"), "old a.cpp");
-  EXPECT_EQ(world.files.at("C:\\p\\ro.cpp"), "new ro.cpp") << "a read-only source is never overwritten";
-  EXPECT_EQ(world.files.at("C:\\p\\locked.cpp"), "new locked.cpp");
-  EXPECT_TRUE(world.files.Exists("C:\\p\\Backup\\locked.cpp.bak")) << "a failed restore keeps its backup";
-  EXPECT_EQ(world.files.at("C:\\p\\Backup\\p.lst"),
-            "C:\\p\\ro.cpp|C:\\p\\Backup\\ro.cpp.bak\r\n"
-            "C:\\p\\b.cpp|C:\\p\\Backup\\b.cpp.bak\r\n"
-            "C:\\p\\locked.cpp|C:\\p\\Backup\\locked.cpp.bak\r\n");
-  EXPECT_EQ(hostLog, (std::vector<std::string>{"C:\\p\\a.cpp restored", "Cannot restore C:\\p\\ro.cpp is read-only",
-                                               "Cannot restore C:\\p\\locked.cpp: Permission denied"}));
-  EXPECT_EQ(writes, (std::vector<std::string>{"1=" + settings["Backups/1"]})) << "the record stays";
-}
-
-TEST_F(RestoreTest, NotConfirmingOrCancellingChangesNothingOnDisk) {
-  Record(1, Project("p", {"a.cpp"}));
-  Record(2, Project("q", {"b.cpp"}));
-  const auto before = world.files.files;
-  Tick({"q"});
-  world.ui.boxAnswers = {7};  // No
-  RestoreSource(module).RestoreSourceFiles(app);
-  EXPECT_EQ(world.files.files, before);
-  EXPECT_EQ(world.ui.boxes, (std::vector<std::string>{"T5016", "T5017"}));
-  EXPECT_TRUE(hostLog.empty());
-
-  world.ui.boxes.clear();
-  world.ui.playRestore = [](platform::RestoreForm& form) {
-    form.SetCheck(0, true);
-    form.Cancel();
-  };
-  RestoreSource(module).RestoreSourceFiles(app);
-  EXPECT_EQ(world.files.files, before);
-  EXPECT_TRUE(world.ui.boxes.empty()) << "Cancel asks nothing";
-}
-
 TEST_F(RestoreTest, OnlyRecordsWithExistingBackupsAreShownAndNoneMeansNoDialog) {
   RestoreSource(module).RestoreSourceFiles(app);
   EXPECT_EQ(world.ui.boxes, std::vector<std::string>{"T5010"});
@@ -462,79 +418,6 @@ TEST_F(RestoreTest, TicksCascadeFromProjectsAndTheHeaderFollowsTheSelection) {
   EXPECT_EQ(world.ui.help, std::vector<std::string>{"C:\\Quarn\\vc.hlp"});
   form.Cancel();
   EXPECT_TRUE(form.rows().empty());
-}
-
-// ------------------------------------------------ module dependency dialog
-
-class DependencyTest : public RestoreTest {
- protected:
-  DependencyTest() {
-    model = std::make_shared<FakeObject>("model", &world.journal);
-    selection = std::make_shared<FakeObject>("selection", nullptr);
-    dependency = std::make_shared<FakeObject>("dep", &world.journal);
-    auto unit = std::make_shared<FakeObject>("unit", nullptr);
-    app->On(hostid::kCurrentModel, "CurrentModel", [this](Args) -> Variant { return ObjectPtr(model); });
-    model->On(hostid::kGetSelectedItems, "GetSelectedItems", [this](Args) -> Variant { return ObjectPtr(selection); });
-    selection->On(hostid::kCount, "Count", [this](Args) -> Variant { return int32_t(selected.size()); })
-        .On(hostid::kGetAt, "GetAt", [this](Args a) -> Variant { return selected.at(a[0].toInt32() - 1); });
-    unit->On(hostid::kKindTest, "IsModifiable", [this](Args) -> Variant { return modifiable; });
-    dependency->On(hostid::kIsKindOf, "IsKindOf", [](Args a) -> Variant { return a[0].toString() == "ModuleVisibilityRelationship"; })
-        .On(hostid::kModuleDependencyUnit, "Unit", [unit](Args) -> Variant { return ObjectPtr(unit); })
-        .On(hostid::kGetPropertyValue, "GetPropertyValue", [this](Args) -> Variant { return property.value_or(""); })
-        .On(hostid::kFindProperty, "FindProperty", [this](Args) -> Variant {
-          return property ? Variant(ObjectPtr(std::make_shared<FakeObject>("prop", nullptr))) : Variant::Nothing();
-        })
-        .On(hostid::kCreateProperty, "CreateProperty", nullptr)
-        .On(hostid::kOverrideProperty, "OverrideProperty", nullptr);
-  }
-  std::vector<std::string> Writes() const {
-    std::vector<std::string> out;
-    for (const std::string& e : world.journal)
-      if (e.starts_with("dep.CreateProperty") || e.starts_with("dep.OverrideProperty")) out.push_back(e);
-    return out;
-  }
-  std::shared_ptr<FakeObject> model, selection, dependency;
-  std::vector<Variant> selected;
-  bool modifiable = true;
-  std::optional<std::string> property;
-};
-
-TEST_F(DependencyTest, OnlyOneSelectedModuleDependencyOpensTheDialog) {
-  auto component = std::make_shared<FakeObject>("component", nullptr);
-  component->On(hostid::kIsKindOf, "IsKindOf", [](Args) -> Variant { return false; });
-  for (auto sel : {std::vector<Variant>{}, std::vector<Variant>{Variant(ObjectPtr(dependency)), Variant(ObjectPtr(dependency))},
-                   std::vector<Variant>{Variant(ObjectPtr(component))}, std::vector<Variant>{Variant("text")}}) {
-    selected = sel;
-    OnModuleDependencyProperties(module, app);
-  }
-  EXPECT_EQ(world.ui.boxes, std::vector<std::string>(4, "Please select a module dependency."));
-  EXPECT_TRUE(world.ui.dependencyViews.empty());
-}
-
-TEST_F(DependencyTest, TheTextIsWrittenOnlyWhenEditedAndConfirmedAndNeverWhenReadOnly) {
-  selected = {Variant(ObjectPtr(dependency))};
-  world.ui.dependencyAnswer = {true, false, ""};  // OK without an edit
-  OnModuleDependencyProperties(module, app);
-  world.ui.dependencyAnswer = {false, true, "/x"};  // edited, then Cancel
-  OnModuleDependencyProperties(module, app);
-  EXPECT_TRUE(Writes().empty());
-
-  world.ui.dependencyAnswer = {true, true, "no_namespace"};
-  OnModuleDependencyProperties(module, app);
-  property = "no_namespace";
-  world.ui.dependencyAnswer = {true, true, "rename(\"a\",\"b\")"};
-  OnModuleDependencyProperties(module, app);
-  EXPECT_EQ(Writes(), (std::vector<std::string>{"dep.CreateProperty VC++ ImportOptions no_namespace Text",
-                                                "dep.OverrideProperty VC++ ImportOptions rename(\"a\",\"b\")"}));
-  EXPECT_EQ(world.ui.dependencyViews.back().text, "no_namespace");
-  EXPECT_EQ(world.ui.dependencyViews.back().caption, "Module Dependency Properties");
-  EXPECT_FALSE(world.ui.dependencyViews.back().readOnly);
-
-  modifiable = false;
-  OnModuleDependencyProperties(module, app);
-  EXPECT_EQ(world.ui.dependencyViews.back().caption, "Module Dependency Properties {read-only}");
-  EXPECT_TRUE(world.ui.dependencyViews.back().readOnly);
-  EXPECT_EQ(Writes().size(), 2u) << "a read-only unit is never written";
 }
 
 }  // namespace

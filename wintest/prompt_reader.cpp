@@ -7,11 +7,17 @@ namespace wintest {
 
 namespace {
 
-BOOL CALLBACK CollectPrompts(HWND window, LPARAM out) {
+struct Search {
+  bool (*test)(HWND);
+  std::vector<HWND> found;
+};
+
+BOOL CALLBACK Collect(HWND window, LPARAM out) {
+  auto* search = reinterpret_cast<Search*>(out);
   DWORD process = 0;
   GetWindowThreadProcessId(window, &process);
-  if (process == GetCurrentProcessId() && IsWindowVisible(window) && IsPromptWindow(window))
-    reinterpret_cast<std::vector<HWND>*>(out)->push_back(window);
+  if (process == GetCurrentProcessId() && IsWindowVisible(window) && search->test(window))
+    search->found.push_back(window);
   return TRUE;
 }
 
@@ -29,20 +35,28 @@ std::string WindowText(HWND window) {
   return kpx::win32::WideToUtf8(text);
 }
 
-bool IsPromptWindow(HWND window) {
+bool IsDialogWith(HWND window, std::initializer_list<int> ids) {
   wchar_t name[16] = {};
   GetClassNameW(window, name, 16);
   if (std::wstring(name) != L"#32770") return false;
-  for (int id : {KPX_PROMPT_MESSAGE, KPX_PROMPT_ICON_CRITICAL, KPX_PROMPT_ICON_QUESTION, KPX_PROMPT_ICON_INFORMATION,
-                 KPX_PROMPT_DONT_SHOW, IDHELP})
+  for (int id : ids)
     if (!GetDlgItem(window, id)) return false;
   return true;
 }
 
+std::vector<HWND> ShownWindows(bool (*test)(HWND)) {
+  Search search{test, {}};
+  EnumWindows(Collect, reinterpret_cast<LPARAM>(&search));
+  return search.found;
+}
+
+bool IsPromptWindow(HWND window) {
+  return IsDialogWith(window, {KPX_PROMPT_MESSAGE, KPX_PROMPT_ICON_CRITICAL, KPX_PROMPT_ICON_QUESTION,
+                               KPX_PROMPT_ICON_INFORMATION, KPX_PROMPT_DONT_SHOW, IDHELP});
+}
+
 std::vector<HWND> ShownPrompts() {
-  std::vector<HWND> found;
-  EnumWindows(CollectPrompts, reinterpret_cast<LPARAM>(&found));
-  return found;
+  return ShownWindows(IsPromptWindow);
 }
 
 PromptSeen ReadPrompt(HWND prompt) {

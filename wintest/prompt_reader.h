@@ -5,6 +5,7 @@
 
 #include "platform/win32/win32_api.h"
 
+#include <initializer_list>
 #include <string>
 #include <vector>
 
@@ -13,6 +14,11 @@
 namespace wintest {
 
 std::string WindowText(HWND window);
+
+// A dialog (#32770) that has a control of each of the ids.
+bool IsDialogWith(HWND window, std::initializer_list<int> ids);
+// The visible top-level windows of this process that pass `test`.
+std::vector<HWND> ShownWindows(bool (*test)(HWND));
 
 // A dialog (#32770) holding the prompt's own controls; a message box or
 // another dialog has none of them.

@@ -11,35 +11,6 @@ namespace wintest {
 
 namespace {
 
-bool IsDialogWith(HWND window, std::initializer_list<int> ids) {
-  wchar_t name[16] = {};
-  GetClassNameW(window, name, 16);
-  if (std::wstring(name) != L"#32770") return false;
-  for (int id : ids)
-    if (!GetDlgItem(window, id)) return false;
-  return true;
-}
-
-struct Search {
-  bool (*test)(HWND);
-  std::vector<HWND> found;
-};
-
-BOOL CALLBACK Collect(HWND window, LPARAM out) {
-  auto* search = reinterpret_cast<Search*>(out);
-  DWORD process = 0;
-  GetWindowThreadProcessId(window, &process);
-  if (process == GetCurrentProcessId() && IsWindowVisible(window) && search->test(window))
-    search->found.push_back(window);
-  return TRUE;
-}
-
-std::vector<HWND> Shown(bool (*test)(HWND)) {
-  Search search{test, {}};
-  EnumWindows(Collect, reinterpret_cast<LPARAM>(&search));
-  return search.found;
-}
-
 HWND List(HWND dialog) { return GetDlgItem(dialog, KPX_RESTORE_LIST); }
 
 std::string Cell(HWND list, int row, int column) {
@@ -69,8 +40,8 @@ bool IsDependencyWindow(HWND window) {
   return IsDialogWith(window, {KPX_DEPENDENCY_LABEL, KPX_DEPENDENCY_TEXT, IDOK, IDCANCEL});
 }
 
-std::vector<HWND> ShownRestoreWindows() { return Shown(IsRestoreWindow); }
-std::vector<HWND> ShownDependencyWindows() { return Shown(IsDependencyWindow); }
+std::vector<HWND> ShownRestoreWindows() { return ShownWindows(IsRestoreWindow); }
+std::vector<HWND> ShownDependencyWindows() { return ShownWindows(IsDependencyWindow); }
 
 std::vector<int> ReadChecks(HWND dialog) {
   HWND list = List(dialog);
@@ -159,7 +130,7 @@ void ClickRow(HWND dialog, int row, bool right) {
 
 HWND WaitForPopupMenu(int milliseconds) {
   for (int waited = 0; waited <= milliseconds; waited += 10) {
-    const std::vector<HWND> menus = Shown(IsPopupMenu);
+    const std::vector<HWND> menus = ShownWindows(IsPopupMenu);
     if (!menus.empty()) return menus.front();
     Sleep(10);
   }

@@ -80,7 +80,6 @@ class WindowUser {
   bool leftOpen_ = false;
 };
 
-void Press(HWND dialog, int id) { SendMessageW(GetDlgItem(dialog, id), BM_CLICK, 0, 0); }
 
 // Waits until `done` holds, up to two seconds (posted input is handled on
 // the window's thread in its own time).
@@ -146,7 +145,7 @@ void ShowsTheForm(HMODULE addin) {
     instructions = RectIn(dialog, KPX_RESTORE_INSTRUCTIONS);
     list = RectIn(dialog, KPX_RESTORE_LIST);
     ok = RectIn(dialog, IDOK);
-    Press(dialog, IDCANCEL);
+    Click(dialog, IDCANCEL);
   });
   ui.ShowRestoreDialog(form, placement);
   CHECK(user.Finish() != nullptr);
@@ -266,11 +265,11 @@ void ActionsGoToTheForm(HMODULE addin) {
       WaitFor([&] { return Called(form, "compare 2"); });
     }
     callsBeforeHelp = form.calls.size();
-    Press(dialog, IDHELP);
+    Click(dialog, IDHELP);
     // OK is disabled: Enter does nothing; a tick enables it, and OK closes.
     SendMessageW(dialog, WM_COMMAND, MAKEWPARAM(IDOK, BN_CLICKED), 0);
     TickRow(dialog, 8, true);
-    Press(dialog, IDOK);
+    Click(dialog, IDOK);
   });
   ui.ShowRestoreDialog(form, {});
   HWND played = user.Finish();
@@ -330,7 +329,7 @@ void SizeAndBounds(HMODULE addin) {
     RECT r;
     GetWindowRect(dialog, &r);
     smallest = {r.right - r.left, r.bottom - r.top};
-    Press(dialog, IDCANCEL);
+    Click(dialog, IDCANCEL);
   });
   ui.ShowRestoreDialog(form, {});
   CHECK(sizer.Finish() != nullptr);
@@ -369,7 +368,7 @@ void SizeAndBounds(HMODULE addin) {
     SetWindowPos(dialog, nullptr, 0, 0, 800, 600, SWP_NOMOVE | SWP_NOZORDER | SWP_NOACTIVATE);
     GetClientRect(dialog, &clientTall);
     helpTall = RectIn(dialog, IDHELP);
-    Press(dialog, IDCANCEL);
+    Click(dialog, IDCANCEL);
   });
   ui.ShowRestoreDialog(narrow, {});
   CHECK(user.Finish() != nullptr);
@@ -409,7 +408,7 @@ void ManyRowsAndFailures(HMODULE addin) {
     rows = seen.rows.size();
     if (!seen.rows.empty()) last = seen.rows.back().cells[2] + "\\" + seen.rows.back().cells[1];
     TickRow(dialog, 9900, true);
-    Press(dialog, IDOK);
+    Click(dialog, IDOK);
   });
   ui.ShowRestoreDialog(big, {});
   CHECK(user.Finish() != nullptr);
@@ -421,7 +420,7 @@ void ManyRowsAndFailures(HMODULE addin) {
 
   TestForm failing(kProjects);
   failing.failHelp = true;
-  WindowUser helpUser(ShownRestoreWindows, [&](HWND dialog) { Press(dialog, IDHELP); });
+  WindowUser helpUser(ShownRestoreWindows, [&](HWND dialog) { Click(dialog, IDHELP); });
   int32_t number = 0;
   try {
     ui.ShowRestoreDialog(failing, {});
@@ -459,7 +458,7 @@ void DependencyDialog(HMODULE addin) {
     seen = ReadDependency(dialog);
     owner = GetWindow(dialog, GW_OWNER);
     TypeDependencyText(dialog, "named_guids");
-    Press(dialog, IDOK);
+    Click(dialog, IDOK);
   });
   kpx::platform::DependencyOutcome outcome = ui.ShowDependencyDialog(view);
   CHECK(editor.Finish() != nullptr);
@@ -476,7 +475,7 @@ void DependencyDialog(HMODULE addin) {
   CHECK_EQ(outcome.text, std::string("named_guids"));
 
   // OK without an edit: nothing changed, the text as it was.
-  WindowUser untouched(ShownDependencyWindows, [&](HWND dialog) { Press(dialog, IDOK); });
+  WindowUser untouched(ShownDependencyWindows, [&](HWND dialog) { Click(dialog, IDOK); });
   outcome = ui.ShowDependencyDialog(view);
   CHECK(untouched.Finish() != nullptr);
   CHECK(outcome.ok && !outcome.changed);
@@ -491,7 +490,7 @@ void DependencyDialog(HMODULE addin) {
     SendMessageW(GetDlgItem(dialog, KPX_DEPENDENCY_TEXT), WM_CHAR, 'x', 0);
     typedAway = WindowText(GetDlgItem(dialog, KPX_DEPENDENCY_TEXT)) != view.text;
     SendMessageW(dialog, WM_COMMAND, MAKEWPARAM(IDOK, BN_CLICKED), 0);
-    if (IsWindow(dialog)) Press(dialog, IDCANCEL);
+    if (IsWindow(dialog)) Click(dialog, IDCANCEL);
   });
   outcome = ui.ShowDependencyDialog(view);
   CHECK(reader.Finish() != nullptr);
@@ -552,7 +551,7 @@ void TheAddinsOwnForm(HMODULE addin, const std::string& scratch) {
     GetClientRect(dialog, &clientNarrow);
     okNarrow = RectIn(dialog, IDOK);
     cancelNarrow = RectIn(dialog, IDCANCEL);
-    Press(dialog, IDCANCEL);
+    Click(dialog, IDCANCEL);
   });
   form.ShowRestoreDialog(nullptr);
   CHECK(user.Finish() != nullptr);

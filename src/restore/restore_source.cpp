@@ -189,9 +189,9 @@ bool RestoreSource::RestoreFile(const std::string& item, const ObjectPtr& QuarnA
   if (!FileExists(files, backup)) {
     message = backup + res.MessageString(5014);
     result = false;
-  } else if (FileExists(files, source)) {
-    const std::optional<uint32_t> attributes = files.GetAttributes(source);
-    if (attributes && (*attributes & platform::kAttributeReadOnly)) {
+  } else if (const std::optional<uint32_t> attributes = files.GetAttributes(source)) {
+    // Asked once: the attributes say whether the source exists as well.
+    if (*attributes & platform::kAttributeReadOnly) {
       // Never forced: the user may have made it read-only on purpose.
       message = ResourceStrings::ReplacePlaceholder(
           "%2", source, ResourceStrings::ReplacePlaceholder("%1", res.MessageString(5013), res.LoadResString(5033)));

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <filesystem>
+#include <sys/stat.h>
 #include <functional>
 #include <map>
 #include <memory>
@@ -112,8 +113,13 @@ class SandboxFileSystem final : public platform::FileSystem {
   bool Fail(int32_t number);
   // Records why a call on `host` failed with `err` (an errno value).
   bool FailErrno(int err, const std::filesystem::path& host);
-  // The host path of an existing file, or nothing with the error recorded.
-  std::optional<std::filesystem::path> ExistingFile(std::string_view path);
+  // An existing file or folder: its host path and what stat says of it; or
+  // nothing, with the error recorded.
+  struct Existing {
+    std::filesystem::path host;
+    struct stat st;
+  };
+  std::optional<Existing> ExistingFile(std::string_view path);
   bool Step(ReplaceStep step) { return !replaceHook_ || replaceHook_(step); }
   // Remembers a new spelling of a name in its folder's listing.
   void Remember(const std::filesystem::path& host);

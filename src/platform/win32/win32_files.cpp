@@ -20,7 +20,9 @@ FILETIME ToFileTime(platform::FileTime t) {
   return {static_cast<DWORD>(t & 0xFFFFFFFFu), static_cast<DWORD>(t >> 32)};
 }
 
-HANDLE HandleOf(platform::FileHandle file) { return reinterpret_cast<HANDLE>(static_cast<intptr_t>(file)); }
+// File and process handles cross the platform interface as 64-bit numbers.
+HANDLE AsHandle(int64_t handle) { return reinterpret_cast<HANDLE>(static_cast<intptr_t>(handle)); }
+int64_t FromHandle(HANDLE handle) { return static_cast<int64_t>(reinterpret_cast<intptr_t>(handle)); }
 
 }  // namespace
 
@@ -120,12 +122,12 @@ platform::FileHandle Win32FileSystem::OpenForTimes(std::string_view path) {
     Failed();
     return platform::kNoFile;
   }
-  return static_cast<platform::FileHandle>(reinterpret_cast<intptr_t>(file));
+  return FromHandle(file);
 }
 
 bool Win32FileSystem::GetFileTimes(platform::FileHandle file, platform::FileTimes& times) {
   FILETIME creation, access, write;
-  if (!GetFileTime(HandleOf(file), &creation, &access, &write)) return Failed();
+  if (!GetFileTime(AsHandle(file), &creation, &access, &write)) return Failed();
   times = {FromFileTime(creation), FromFileTime(access), FromFileTime(write)};
   return true;
 }
@@ -133,11 +135,11 @@ bool Win32FileSystem::GetFileTimes(platform::FileHandle file, platform::FileTime
 bool Win32FileSystem::SetFileTimes(platform::FileHandle file, const platform::FileTimes& times) {
   const FILETIME creation = ToFileTime(times.creation), access = ToFileTime(times.lastAccess),
                  write = ToFileTime(times.lastWrite);
-  return SetFileTime(HandleOf(file), &creation, &access, &write) || Failed();
+  return SetFileTime(AsHandle(file), &creation, &access, &write) || Failed();
 }
 
 void Win32FileSystem::CloseFile(platform::FileHandle file) {
-  if (file != platform::kNoFile) ::CloseHandle(HandleOf(file));
+  if (file != platform::kNoFile) ::CloseHandle(AsHandle(file));
 }
 
 std::optional<platform::FileTime> Win32Clock::SystemFileTime() {
@@ -149,11 +151,6 @@ std::optional<platform::FileTime> Win32Clock::SystemFileTime() {
 }
 
 // ---------------------------------------------------------- child processes
-
-namespace {
-HANDLE AsHandle(int64_t handle) { return reinterpret_cast<HANDLE>(static_cast<intptr_t>(handle)); }
-int64_t FromHandle(HANDLE handle) { return static_cast<int64_t>(reinterpret_cast<intptr_t>(handle)); }
-}  // namespace
 
 #ifndef _WIN64
 // The start-up record callers and tools of the 32-bit host know.
