@@ -648,6 +648,12 @@ void AddChanges(EventJson& step, const RestoreState& before, const RestoreState&
   if (after.ok != before.ok) step["okEnabled"] = after.ok;
 }
 
+// The list tells the dialog of a row newly selected only: selecting the
+// row that is already selected changes nothing.
+void SelectAsTheListDoes(platform::RestoreForm& form, int32_t row) {
+  if (form.selectedRow() != row) form.Select(row);
+}
+
 const char* StepName(RestoreStep::Kind kind) {
   switch (kind) {
     case RestoreStep::Kind::Tick: return "tick";
@@ -715,9 +721,12 @@ void SimUserInterface::ShowRestoreDialog(platform::RestoreForm& form, const plat
           form.SetCheck(row, step.kind == RestoreStep::Kind::Tick);
           break;
         case RestoreStep::Kind::Select:
-          form.Select(row);
+          SelectAsTheListDoes(form, row);
           break;
         case RestoreStep::Kind::Click: {
+          // A click on a row, left or right, selects it before the dialog
+          // hears of the click, as the list control does.
+          SelectAsTheListDoes(form, row);
           bool startTimer = false;
           const std::string caption = form.Click(row, startTimer);
           if (!caption.empty()) {

@@ -323,6 +323,7 @@ class FakeRestoreForm final : public platform::RestoreForm {
   double minimumHeight() const override { return 0; }
   void Resize(double, double, platform::ControlRect (&)[size_t(platform::RestoreControl::Count)]) override {}
   void Select(int32_t row) override {
+    calls.push_back("select " + std::to_string(row));
     selected_ = row;
     title_ = rows_[size_t(row)].project ? "Project" : "Files";
   }
@@ -370,7 +371,9 @@ TEST(SimRestoreDialog, PlaysTheQueuedStepsAndRecordsWhatEachChanged) {
     "ok"]}}])");
   FakeRestoreForm form;
   w.sim().platform().ui.ShowRestoreDialog(form, kPlacement);
-  EXPECT_EQ(form.calls, (std::vector<std::string>{"compare 1", "timer", "help 4444", "ok"}));
+  // A click selects its row first, as a real click does.
+  EXPECT_EQ(form.calls, (std::vector<std::string>{"select 0", "select 1", "compare 1", "select 0", "timer",
+                                                  "help 4444", "ok"}));
   const auto events = w.Events("restore-dialog");
   ASSERT_EQ(events.size(), 1u);
   const EventJson& e = events[0];
@@ -394,12 +397,31 @@ TEST(SimRestoreDialog, PlaysTheQueuedStepsAndRecordsWhatEachChanged) {
   EXPECT_FALSE(steps[1].contains("okEnabled"));
   EXPECT_EQ(steps[2]["selected"], "Shapes");
   EXPECT_EQ(steps[2]["title"], "Project");
-  EXPECT_EQ(steps[3]["menu"], "WinDiff");
-  EXPECT_EQ(steps[5]["timerStarted"], true);
+  EXPECT_EQ(steps[3], (EventJson{{"step", "click"},
+                                 {"row", "C:\\p\\Circle.cpp"},
+                                 {"selected", "C:\\p\\Circle.cpp"},
+                                 {"title", "Files"},
+                                 {"menu", "WinDiff"}}));
+  EXPECT_EQ(steps[5], (EventJson{{"step", "click"},
+                                 {"row", "Shapes"},
+                                 {"selected", "Shapes"},
+                                 {"title", "Project"},
+                                 {"timerStarted", true}}));
   EXPECT_EQ(steps[8]["step"], "ok");
   EXPECT_EQ(e["pressed"], "ok");
   EXPECT_EQ(e["answered"], "scenario");
   EXPECT_TRUE(w.Events("world-failed").empty());
+}
+
+TEST(SimRestoreDialog, TheRowAlreadySelectedIsNotSelectedAgain) {
+  SimWorld w("{}");
+  Apply(w, R"([{"answer": {"restore": [{"select": "Shapes"}, {"click": "Shapes"}, {"select": "Shapes"}, "cancel"]}}])");
+  FakeRestoreForm form;
+  w.sim().platform().ui.ShowRestoreDialog(form, kPlacement);
+  EXPECT_EQ(form.calls, (std::vector<std::string>{"select 0", "cancel"}));
+  const EventJson steps = w.Events("restore-dialog").at(0)["steps"];
+  EXPECT_FALSE(steps[1].contains("selected"));
+  EXPECT_FALSE(steps[2].contains("selected"));
 }
 
 TEST(SimRestoreDialog, AStepTheDialogCannotTakeEndsThePlayWithCancel) {
