@@ -382,13 +382,6 @@ class Screen final : public kpx::platform::UserInterface {
   kpx::win32::Win32UserInterface real_;
 };
 
-std::vector<std::string> EventsOf(const kpx::sim::EventLog& log, const char* kind) {
-  std::vector<std::string> out;
-  for (const kpx::sim::EventJson& ev : log.events())
-    if (ev.at("ev") == kind) out.push_back(ev.dump());
-  return out;
-}
-
 void ScriptedUserPlaysPrompts(HMODULE addin) {
   Group("kpx-comsim's scripted user reads the real prompt and plays the scenario's answers as the simulator does");
   kpx::win32::ServerLocks locks;
@@ -454,6 +447,15 @@ void ScriptedUserPlaysPrompts(HMODULE addin) {
 #endif
 
 }  // namespace
+
+#if KPX_WINTEST_SCRIPTED_USER
+std::vector<std::string> EventsOf(const kpx::sim::EventLog& log, const char* kind) {
+  std::vector<std::string> out;
+  for (const kpx::sim::EventJson& ev : log.events())
+    if (ev.at("ev") == kind) out.push_back(ev.dump());
+  return out;
+}
+#endif
 
 void PromptWindowTests(HMODULE addin) {
   TextsIconsAndHelp(addin);

@@ -25,6 +25,16 @@
 #include "restore/kpx_restore_form.h"
 #include "shared/module.h"
 
+#if KPX_WINTEST_SCRIPTED_USER
+#include "prompt_tests.h"
+#include "scripted_user.h"
+#include "sim/event_log.h"
+#include "sim/json_source.h"
+#include "sim/model_file.h"
+#include "sim/scenario_file.h"
+#include "sim/sim_platform.h"
+#endif
+
 namespace wintest {
 
 namespace {
@@ -387,14 +397,14 @@ void SizeAndBounds(HMODULE addin) {
 }
 
 void ManyRowsAndFailures(HMODULE addin) {
-  Group("the Restore window opens quickly with 10,000 rows; what the form raises closes it and reaches the caller");
+  Group("the Restore window shows 100 projects of 100 files each; what the form raises closes it and reaches the caller");
   kpx::win32::ServerLocks locks;
   kpx::win32::ComBridge bridge(locks);
   kpx::win32::Win32UserInterface ui(bridge, addin);
   std::vector<TestForm::Project> many;
   for (int p = 0; p < 100; ++p) {
     TestForm::Project project{"Project " + std::to_string(p), {}};
-    for (int f = 0; f < 99; ++f) project.files.push_back("file" + std::to_string(f) + ".cpp");
+    for (int f = 0; f < 100; ++f) project.files.push_back("file" + std::to_string(f) + ".cpp");
     many.push_back(project);
   }
   TestForm big(many);
@@ -407,16 +417,17 @@ void ManyRowsAndFailures(HMODULE addin) {
     const RestoreSeen seen = ReadRestore(dialog);
     rows = seen.rows.size();
     if (!seen.rows.empty()) last = seen.rows.back().cells[2] + "\\" + seen.rows.back().cells[1];
-    TickRow(dialog, 9900, true);
+    TickRow(dialog, 9999, true);
     Click(dialog, IDOK);
   });
   ui.ShowRestoreDialog(big, {});
   CHECK(user.Finish() != nullptr);
-  std::printf("  10,000 rows shown in %lu ms\n", static_cast<unsigned long>(opened));
-  CHECK(opened < 5000);
-  CHECK_EQ(rows, size_t{10000});
-  CHECK_EQ(last, std::string("C:\\work\\Project 99\\file98.cpp"));
-  CHECK(big.rows()[9900].check == 1 && big.rows()[9999].check == 1);
+  // A benchmark, not a check: the time depends on the machine and on Wine.
+  std::printf("  benchmark: the Restore window showed 10,000 file rows (100 projects of 100 files) in %lu ms\n",
+              static_cast<unsigned long>(opened));
+  CHECK_EQ(rows, size_t{10100});
+  CHECK_EQ(last, std::string("C:\\work\\Project 99\\file99.cpp"));
+  CHECK(big.rows()[9999].check == 1 && big.rows()[10099].check == 1);
 
   TestForm failing(kProjects);
   failing.failHelp = true;
@@ -591,6 +602,50 @@ void TheAddinsOwnForm(HMODULE addin, const std::string& scratch) {
   CHECK(form.rows().empty());
 }
 
+#if KPX_WINTEST_SCRIPTED_USER
+
+void ScriptedUserPlaysTheRestoreWindow(HMODULE addin) {
+  Group("kpx-comsim's scripted user plays a scenario's Restore steps on the real window as the simulator plays them on the form");
+  kpx::win32::ServerLocks locks;
+  kpx::win32::ComBridge bridge(locks);
+  kpx::win32::Win32UserInterface ui(bridge, addin);
+  // A partly ticked project ticked again, a menu's command, a second click
+  // on the selected project restarting the timer, a menu the next step
+  // closes, Help, a project unticked, OK.
+  const kpx::sim::ModelDef model = kpx::sim::LoadModel(kpx::sim::JsonSource("model.json", "{}"));
+  const kpx::sim::Scenario scenario = kpx::sim::LoadScenario(
+      kpx::sim::JsonSource("restore.json", R"({"actions": [{"answer": {"restore": [
+        {"tick": "Shapes"}, {"untick": "C:\\work\\Shapes\\circle.h"}, {"tick": "Shapes"}, {"select": "Brushes"},
+        {"click": "C:\\work\\Tools\\ruler.cpp"}, {"compare": true}, {"click": "Tools"}, {"click": "Tools"},
+        {"timer": true}, {"click": "C:\\work\\Tools\\pen.h"}, {"select": "Shapes"}, {"help": true},
+        {"untick": "Shapes"}, {"tick": "C:\\work\\Tools\\pen.h"}, "ok"]}}]})"),
+      model);
+  kpx::sim::EventLog nativeLog, comLog;
+  kpx::sim::SimUserInterface native(nativeLog), played(comLog);
+  native.QueueRestoreAnswer(*scenario.actions.at(0).restore);
+  played.QueueRestoreAnswer(*scenario.actions.at(0).restore);
+  TestForm nativeForm(kProjects), realForm(kProjects);
+  nativeForm.timerOnClick = realForm.timerOnClick = true;
+  native.ShowRestoreDialog(nativeForm, {});
+  {
+    ScriptedUser user(played);
+    ui.ShowRestoreDialog(realForm, {});
+  }
+  const std::vector<std::string> calls = {"tick 0",  "untick 2", "tick 0",  "select 3", "select 6", "click 6",
+                                          "compare 6", "select 5", "click 5", "click 5",  "timer",    "select 8",
+                                          "click 8", "select 0", "help",     "untick 0", "tick 8",   "ok"};
+  CHECK(nativeForm.calls == calls);
+  if (!CHECK(realForm.calls == calls))
+    for (const std::string& c : realForm.calls) std::printf("    window's call: %s\n", c.c_str());
+  const std::vector<std::string> want = EventsOf(nativeLog, "restore-dialog"), got = EventsOf(comLog, "restore-dialog");
+  CHECK_EQ(want.size(), size_t{1});
+  CHECK_EQ(got.size(), want.size());
+  for (size_t i = 0; i < want.size() && i < got.size(); ++i) CHECK_EQ(got[i], want[i]);
+  CHECK_EQ(comLog.events().size(), got.size());  // nothing failed
+}
+
+#endif
+
 }  // namespace
 
 void RestoreWindowTests(HMODULE addin, const std::string& scratch) {
@@ -600,6 +655,9 @@ void RestoreWindowTests(HMODULE addin, const std::string& scratch) {
   ManyRowsAndFailures(addin);
   TheAddinsOwnForm(addin, scratch);
   DependencyDialog(addin);
+#if KPX_WINTEST_SCRIPTED_USER
+  ScriptedUserPlaysTheRestoreWindow(addin);
+#endif
 }
 
 }  // namespace wintest

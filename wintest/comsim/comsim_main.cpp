@@ -19,11 +19,15 @@
 // Its event log is then held against the native run's golden log, leaving
 // out what only the native run can see or what depends on the real machine:
 //  - the add-in's own calls to its platform (registry-*, file-*, sleep,
-//    doevents, help): in the DLL they go straight to Win32, past any host
-//    object, so no COM host can record them. WinHelpA hands its arguments
-//    to the help viewer, another process; a message box or a prompt,
-//    though, is seen on the screen: its texts, buttons and answer are
-//    compared;
+//    doevents, help, process): in the DLL they go straight to Win32, past
+//    any host object, so no COM host can record them. WinHelpA hands its
+//    arguments to the help viewer, another process; a message box or a
+//    prompt, though, is seen on the screen: its texts, buttons and answer
+//    are compared. So is the Restore dialog, but for what its closing
+//    button left in the form behind it, which no window shows. The
+//    programs the DLL started are compared apart: each start the child
+//    program recorded (its program and command line) against the native
+//    run's started processes, in order;
 //  - the kind of a companion's call when it is a get or a method: a call
 //    through IDispatch asks for both at once;
 //  - the debug log events: compared instead with the real log file the DLL
@@ -33,9 +37,14 @@
 //
 // The model's faults reach the DLL where they lie in the simulated world:
 // host calls and resource texts fail inside the sim's objects, which the DLL
-// calls through COM. Registry faults must be made real, as the DLL uses the
-// registry itself (see MakeRegistryFaults); a scenario whose faults cannot
-// be is reported as skipped, with the reason.
+// calls through COM. Registry and file faults must be made real, as the DLL
+// uses the registry and the files itself (see MakeRegistryFaults,
+// FileFaults); so must the programs the model lists, which the DLL really
+// starts (see MakePrograms). A scenario whose faults or programs cannot be
+// made real is reported as skipped, with the reason.
+//
+// The Restore dialog is the real window too, played step by step by the
+// watcher through the simulator's own player (see restore_player.h).
 //
 // Usage: kpx-comsim <scenario.json> <golden.jsonl> <out.jsonl>
 // Exit: 0 same, 1 different, 2 bad input or failure, 3 skipped.
@@ -152,12 +161,114 @@ std::string MakeRegistryFaults(const ModelDef& model, const Scenario& scenario) 
   return "";
 }
 
+// A file fault made real: the file held open without leave to delete it,
+// for the run. Only a failing delete with "Permission denied" (70) can be
+// had so: the DLL takes the sharing violation for that error.
+class FileFaults {
+ public:
+  FileFaults() = default;
+  FileFaults(const FileFaults&) = delete;
+  FileFaults& operator=(const FileFaults&) = delete;
+  ~FileFaults() { Release(); }
+
+  // Why the model's file faults cannot be made real; "" when they can.
+  static std::string Unmade(const ModelDef& model) {
+    for (const auto& [path, f] : model.faults.files) {
+      if (f.move || f.replace || f.times)
+        return "the model makes moving, replacing or stamping " + path +
+               " fail, which a real file cannot be made to do without failing its delete first";
+      if (f.remove && f.remove->number != vberr::kPermissionDenied)
+        return "the model makes deleting " + path + " fail with error " + std::to_string(f.remove->number) +
+               ", and a real file held open fails it with Permission denied (70)";
+    }
+    return "";
+  }
+
+  // Once the model's files are in place. "" when done, else why not.
+  std::string Hold(const ModelDef& model) {
+    for (const auto& [path, f] : model.faults.files) {
+      if (!f.remove) continue;
+      const std::wstring wide = win32::Utf8ToWide(path);
+      HANDLE file = CreateFileW(wide.c_str(), GENERIC_READ, FILE_SHARE_READ | FILE_SHARE_WRITE, nullptr, OPEN_EXISTING,
+                                FILE_ATTRIBUTE_NORMAL, nullptr);
+      if (file == INVALID_HANDLE_VALUE) return "cannot open " + path + " to keep it from being deleted";
+      held_.push_back(file);
+      // A delete must now be refused.
+      HANDLE probe = CreateFileW(wide.c_str(), DELETE, FILE_SHARE_READ | FILE_SHARE_WRITE | FILE_SHARE_DELETE, nullptr,
+                                 OPEN_EXISTING, FILE_ATTRIBUTE_NORMAL, nullptr);
+      if (probe != INVALID_HANDLE_VALUE) {
+        CloseHandle(probe);
+        return "this system lets a file held open be deleted, so deleting " + path + " cannot be made to fail";
+      }
+    }
+    return "";
+  }
+
+  void Release() {
+    for (HANDLE file : held_) CloseHandle(file);
+    held_.clear();
+  }
+
+ private:
+  std::vector<HANDLE> held_;
+};
+
+// The model's programs made real, as far as real programs can be. One that
+// ends with an exit code is the test's child program (wintest/child.cpp),
+// copied to the program's path and told its exit code; the files for that
+// go into `paths` first, so that they are journaled and removed. One that
+// cannot be started must be missing here, where a real start fails with
+// error 2 (file not found). "" when all can be, else why not.
+std::string ProgramsUnmade(const ModelDef& model, std::vector<std::string>& paths) {
+  for (const auto& [program, def] : model.processes) {
+    switch (def.kind) {
+      case ProcessDef::Kind::Exits:
+        if (program.size() < 3 || program[1] != ':' || program[2] != '\\')
+          return "the model's program " + program + " has no full path to put a real program at";
+        if (fs::exists(fs::path(win32::Utf8ToWide(program))))
+          return "the model's program " + program + " is a real one on this system, not to be replaced";
+        paths.push_back(program);
+        paths.push_back(program + ".exit");
+        break;
+      case ProcessDef::Kind::StartFails:
+        if (def.error != 2)
+          return "the model's program " + program + " fails to start with error " + std::to_string(def.error) +
+                 ", and a real start fails with 2 (file not found) only";
+        if (SearchPathW(nullptr, win32::Utf8ToWide(program).c_str(), L".exe", 0, nullptr, nullptr) != 0)
+          return "the model's program " + program + " fails to start, and this system has it";
+        break;
+      case ProcessDef::Kind::TimesOut:
+        return "the model's program " + program +
+               " never ends, and a real one would hold the add-in, which waits for it up to 24 days";
+      case ProcessDef::Kind::WaitFails:
+        return "waiting for the model's program " + program + " fails, which a real wait cannot be made to do";
+    }
+  }
+  return "";
+}
+
+void PlacePrograms(const ModelDef& model, const fs::path& child) {
+  for (const auto& [program, def] : model.processes) {
+    if (def.kind != ProcessDef::Kind::Exits) continue;
+    const fs::path at(win32::Utf8ToWide(program));
+    fs::create_directories(at.parent_path());
+    fs::copy_file(child, at, fs::copy_options::overwrite_existing);
+    std::ofstream(fs::path(at.wstring() + L".exit")) << def.exitCode;
+  }
+}
+
 // ------------------------------------------------------------ comparing
 
+std::string Lower(std::string s) {
+  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+  return s;
+}
+
 bool PlatformEvent(const std::string& ev) {
-  static const std::set<std::string> kinds = {"registry-read", "registry-write", "registry-create", "file-exists",
-                                              "file-delete",   "file-append",    "file-read",       "sleep",
-                                              "doevents",      "help",           "debuglog"};
+  static const std::set<std::string> kinds = {
+      "registry-read", "registry-write",  "registry-create", "file-exists", "file-delete", "file-append",
+      "file-read",     "file-attributes", "file-remove",     "file-move",   "file-times",  "file-replace",
+      "file-date",     "sleep",           "doevents",        "help",        "process",     "debuglog"};
   return kinds.count(ev) != 0;
 }
 
@@ -173,7 +284,31 @@ std::string AsBothSeeIt(const std::string& line) {
   if (kind == "companion-call" && ev.contains("kind") && (ev["kind"] == "get" || ev["kind"] == "method"))
     ev.erase("kind");
   if (kind == "messagebox") ev["style"] = ev.at("style").get<uint32_t>() & 0xFu;
+  if (kind == "restore-dialog" && !ev.at("steps").empty()) {
+    EventJson& last = ev["steps"].back();
+    if (last.at("step") == "ok" || last.at("step") == "cancel") {
+      EventJson closing{{"step", last.at("step")}};
+      if (last.contains("failed")) closing["failed"] = last["failed"];
+      last = std::move(closing);
+    }
+  }
   return ev.dump();
+}
+
+// A started program as the child program records it: the program, a tab,
+// its command line. The native run's process events name the program as
+// the add-in did: its application name, else its command line's first word.
+std::string StartOf(const EventJson& process) {
+  std::string program = process.value("application", "");
+  const std::string line = process.at("commandLine");
+  if (program.empty()) {
+    const size_t start = line.find_first_not_of(" \t");
+    if (start != std::string::npos && line[start] == '"')
+      program = line.substr(start + 1, line.find('"', start + 1) - start - 1);
+    else if (start != std::string::npos)
+      program = line.substr(start, line.find_first_of(" \t", start) - start);
+  }
+  return Lower(program) + "\t" + line;
 }
 
 // A debug line from its level on: the stamp before it is the clock's.
@@ -196,21 +331,19 @@ std::vector<std::string> Lines(const std::string& text) {
   return out;
 }
 
-std::string Lower(std::string s) {
-  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return s;
-}
-
 // `served`: the ProgIDs and class ids this host serves (lower case). A
 // creation by any other name fails inside COM on Windows, before any host
 // code runs: the native run's record of that failure has no counterpart.
+// `starts`: the child program's record of the programs started.
 int Compare(const std::string& golden, const std::string& ours, const std::string& debugText,
-            const std::string& logPath, const std::set<std::string>& served) {
-  std::vector<std::string> want, got, wantDebug, gotDebug;
+            const std::string& logPath, const std::set<std::string>& served, const std::string& starts) {
+  std::vector<std::string> want, got, wantDebug, gotDebug, wantStarts, gotStarts;
   for (const std::string& l : Lines(golden)) {
     EventJson ev = EventJson::parse(l);
     const std::string kind = ev.at("ev");
-    if (kind == "debuglog") {
+    if (kind == "process") {
+      if (ev.at("started").get<bool>()) wantStarts.push_back(StartOf(ev));
+    } else if (kind == "debuglog") {
       if (ev.at("ok").get<bool>() && Comparable(ev.at("line"))) wantDebug.push_back(WithoutStamp(ev.at("line")));
     } else if (kind == "file-delete") {
       // The file on disk holds what was written since it was last deleted.
@@ -226,6 +359,10 @@ int Compare(const std::string& golden, const std::string& ours, const std::strin
     if (!PlatformEvent(EventJson::parse(l).at("ev"))) got.push_back(AsBothSeeIt(l));
   for (const std::string& l : Lines(debugText))
     if (Comparable(l)) gotDebug.push_back(WithoutStamp(l));
+  for (const std::string& l : Lines(starts)) {
+    const size_t tab = std::min(l.find('\t'), l.size());
+    gotStarts.push_back(Lower(l.substr(0, tab)) + l.substr(tab));
+  }
 
   int differences = 0;
   auto diff = [&](const char* what, const std::vector<std::string>& a, const std::vector<std::string>& b) {
@@ -240,7 +377,9 @@ int Compare(const std::string& golden, const std::string& ours, const std::strin
   };
   diff("event", want, got);
   diff("debug line", wantDebug, gotDebug);
-  std::printf("  %zu events, %zu debug lines compared\n", want.size(), wantDebug.size());
+  diff("program started", wantStarts, gotStarts);
+  std::printf("  %zu events, %zu debug lines, %zu program starts compared\n", want.size(), wantDebug.size(),
+              wantStarts.size());
   return differences == 0 ? 0 : 1;
 }
 
@@ -274,19 +413,17 @@ int Main(int argc, char** argv) {
     return 3;
   }
 
-  // The Restore dialog's steps (clicks, the comparison menu, the timer) are
-  // not played on the real window yet.
-  for (const Action& a : scenario.actions) {
-    if (a.type == Action::Type::Answer && a.restore) {
-      std::printf("  skipped: the scenario works the Restore dialog, which is not played on the real window yet\n");
-      return 3;
-    }
-  }
-
   const auto trees = TreesOf(model, scenario);
   RemoveTrees(trees);
   RemoveJournaled();
-  const std::string unmade = MakeRegistryFaults(model, scenario);
+  std::vector<std::string> touched = model.folders;
+  std::string unmade = FileFaults::Unmade(model);
+  if (unmade.empty()) unmade = ProgramsUnmade(model, touched);
+  if (!unmade.empty()) {
+    std::printf("  skipped: %s\n", unmade.c_str());
+    return 3;
+  }
+  unmade = MakeRegistryFaults(model, scenario);
   if (!unmade.empty()) {
     RemoveTrees(trees);
     std::printf("  skipped: %s\n", unmade.c_str());
@@ -307,7 +444,6 @@ int Main(int argc, char** argv) {
   DebugLogger settings(machine.platform());
   const std::string logPath = settings.DebugMask() ? settings.DebugOutputPath() : std::string();
 
-  std::vector<std::string> touched = model.folders;
   for (const auto& [path, content] : model.files) touched.push_back(path);
   for (const Action& a : scenario.actions)
     for (const auto& [path, content] : a.files) touched.push_back(path);
@@ -315,7 +451,17 @@ int Main(int argc, char** argv) {
   const std::vector<fs::path> added = NewPaths(touched);
   Journal(added);
 
+  // The child program, beside this one, stands in for the model's
+  // programs; each start it records goes to a file beside the log.
+  wchar_t self[MAX_PATH] = {};
+  GetModuleFileNameW(nullptr, self, MAX_PATH);
+  PlacePrograms(model, fs::path(self).parent_path() / L"kpx-child.exe");
+  const fs::path startsFile = fs::path(argv[3]).wstring() + L".starts";
+  fs::remove(startsFile);
+  SetEnvironmentVariableW(L"KPX_CHILD_CALLS", startsFile.wstring().c_str());
+
   std::string jsonl, debugText;
+  FileFaults fileFaults;
   {
     // The host's bridge outlives the simulation: the add-in object the
     // simulation holds came through it.
@@ -327,10 +473,16 @@ int Main(int argc, char** argv) {
     Simulation sim(model, {registry, files, seeder}, [&host] { return CreateAddIn(host->bridge); }, objects);
     host = std::make_unique<Host>(model, sim.platform().objects);
     host->RegisterAll();
-    {
+    // The model's files are in place before the run: a file fault holds one.
+    sim.Prepare();
+    unmade = fileFaults.Hold(model);
+    if (unmade.empty()) {
       wintest::ScriptedUser user(sim.platform().ui);
+      const ApplicationDef& app = model.application;
+      user.PlaceHost({app.mainWindow, app.top, app.left, app.height, app.width});
       sim.Run(scenario);
     }
+    fileFaults.Release();
     if (int ended = wintest::ScriptedUser::EndChildren()) std::printf("  ended %d process(es) the add-in left running\n", ended);
     CoFreeUnusedLibraries();
     host->RevokeAll();
@@ -340,6 +492,10 @@ int Main(int argc, char** argv) {
 
   RemoveTrees(trees);
   RemoveJournaled();
+  if (!unmade.empty()) {
+    std::printf("  skipped: %s\n", unmade.c_str());
+    return 3;
+  }
 
   std::ofstream(argv[3], std::ios::binary) << jsonl;
   std::set<std::string> served = {Lower(wintest::kResourceProgId), Lower(wintest::kResourceClsid)};
@@ -347,7 +503,7 @@ int Main(int argc, char** argv) {
     if (!c->progid.empty()) served.insert(Lower(c->progid));
     if (!c->clsid.empty()) served.insert(Lower(c->clsid));
   }
-  return Compare(golden, jsonl, debugText, logPath, served);
+  return Compare(golden, jsonl, debugText, logPath, served, ReadAll(startsFile));
 }
 
 }  // namespace

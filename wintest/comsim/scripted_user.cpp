@@ -2,12 +2,15 @@
 
 #include <tlhelp32.h>
 
+#include <cstdio>
+#include <exception>
 #include <iterator>
 #include <string>
 #include <vector>
 
 #include "platform/win32/prompt_window_ids.h"
 #include "prompt_reader.h"
+#include "restore_player.h"
 #include "restore_reader.h"
 
 namespace wintest {
@@ -132,6 +135,8 @@ LRESULT CALLBACK ScriptedUser::WindowProc(HWND window, UINT message, WPARAM wPar
     if (user) user->Answer(reinterpret_cast<HWND>(lParam));
     return 0;
   }
+  LRESULT result = 0;
+  if (AnswerRestoreHelp(message, wParam, lParam, result)) return result;
   return DefWindowProcW(window, message, wParam, lParam);
 }
 
@@ -152,6 +157,10 @@ void ScriptedUser::Answer(HWND box) {
   }
   if (IsDependencyWindow(box)) {
     AnswerDependency(box);
+    return;
+  }
+  if (IsRestoreWindow(box)) {
+    AnswerRestore(box);
     return;
   }
   const int button = answers_.MessageBox(MessageOf(box), WindowText(box), ButtonsOf(box));
@@ -185,6 +194,37 @@ void ScriptedUser::AnswerDependency(HWND dialog) {
   const kpx::platform::DependencyOutcome outcome = answers_.ShowDependencyDialog(view);
   if (outcome.changed) TypeDependencyText(dialog, outcome.text);
   Click(dialog, outcome.ok ? IDOK : IDCANCEL);
+}
+
+// The Restore window is played from a thread of its own (see
+// restore_player.h) while this thread, the window's, goes on handling its
+// messages. The dialog's own loop takes over again once the play is done,
+// its closing button pressed and its record made: only then does the
+// add-in go on past the dialog.
+void ScriptedUser::AnswerRestore(HWND dialog) {
+  restore_ = dialog;
+  HANDLE player = CreateThread(nullptr, 0, PlayRestore, this, 0, nullptr);
+  while (MsgWaitForMultipleObjectsEx(1, &player, INFINITE, QS_ALLINPUT, MWMO_INPUTAVAILABLE) != WAIT_OBJECT_0) {
+    MSG message;
+    while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) {
+      TranslateMessage(&message);
+      DispatchMessageW(&message);
+    }
+  }
+  CloseHandle(player);
+  restore_ = nullptr;
+}
+
+DWORD WINAPI ScriptedUser::PlayRestore(void* self) {
+  auto* user = static_cast<ScriptedUser*>(self);
+  try {
+    RestoreWindowForm form(user->restore_, user->window_);
+    user->answers_.ShowRestoreDialog(form, PlacementSeen(user->restore_, user->host_));
+  } catch (const std::exception& e) {
+    std::printf("  the Restore window could not be played: %s\n", e.what());
+    if (IsWindowVisible(user->restore_)) Click(user->restore_, IDCANCEL);
+  }
+  return 0;
 }
 
 int ScriptedUser::EndChildren() {
