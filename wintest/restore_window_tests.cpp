@@ -626,11 +626,19 @@ void ScriptedUserPlaysTheRestoreWindow(HMODULE addin) {
   played.QueueRestoreAnswer(*scenario.actions.at(0).restore);
   TestForm nativeForm(kProjects), realForm(kProjects);
   nativeForm.timerOnClick = realForm.timerOnClick = true;
-  native.ShowRestoreDialog(nativeForm, {});
+  // Over a host window that owns it.
+  HWND host = HostWindow();
+  RECT hostRect;
+  GetWindowRect(host, &hostRect);
+  const kpx::platform::HostPlacement placement{reinterpret_cast<int64_t>(host), hostRect.top, hostRect.left,
+                                               hostRect.bottom - hostRect.top, hostRect.right - hostRect.left};
+  native.ShowRestoreDialog(nativeForm, placement);
   {
     ScriptedUser user(played);
-    ui.ShowRestoreDialog(realForm, {});
+    user.PlaceHost(placement);
+    ui.ShowRestoreDialog(realForm, placement);
   }
+  DestroyWindow(host);
   const std::vector<std::string> calls = {"tick 0",  "untick 2", "tick 0",  "select 3", "select 6", "click 6",
                                           "compare 6", "select 5", "click 5", "click 5",  "timer",    "select 8",
                                           "click 8", "select 0", "help",     "untick 0", "tick 8",   "ok"};
@@ -642,6 +650,24 @@ void ScriptedUserPlaysTheRestoreWindow(HMODULE addin) {
   CHECK_EQ(got.size(), want.size());
   for (size_t i = 0; i < want.size() && i < got.size(); ++i) CHECK_EQ(got[i], want[i]);
   CHECK_EQ(comLog.events().size(), got.size());  // nothing failed
+
+  // A window that does not stand where the host said it is shows where it
+  // does stand: here over the work area, with no owner.
+  kpx::sim::EventLog elsewhereLog;
+  kpx::sim::SimUserInterface elsewhere(elsewhereLog);
+  TestForm unplaced(kProjects);
+  {
+    ScriptedUser user(elsewhere);
+    user.PlaceHost({0, 100, 100, 300, 400});
+    ui.ShowRestoreDialog(unplaced, {});
+  }
+  const std::vector<std::string> shown = EventsOf(elsewhereLog, "restore-dialog");
+  if (CHECK_EQ(shown.size(), size_t{1})) {
+    const kpx::sim::EventJson ev = kpx::sim::EventJson::parse(shown[0]);
+    CHECK_EQ(ev.at("owner").get<int64_t>(), int64_t{0});
+    CHECK(ev.at("host") != (kpx::sim::EventJson{{"top", 100}, {"left", 100}, {"height", 300}, {"width", 400}}));
+    CHECK(ev.at("host").at("width").get<int>() > 0);
+  }
 }
 
 #endif

@@ -40,7 +40,7 @@
 // calls through COM. Registry and file faults must be made real, as the DLL
 // uses the registry and the files itself (see MakeRegistryFaults,
 // FileFaults); so must the programs the model lists, which the DLL really
-// starts (see MakePrograms). A scenario whose faults or programs cannot be
+// starts (see ProgramsUnmade). A scenario whose faults or programs cannot be
 // made real is reported as skipped, with the reason.
 //
 // The Restore dialog is the real window too, played step by step by the
