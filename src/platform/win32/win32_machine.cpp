@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <vector>
 
+#include "automation/vb_strings.h"
 #include "platform/win32/win32_api.h"
 #include "platform/win32/win32_strings.h"
 
@@ -27,11 +28,34 @@ HKEY Root(Hive hive) {
 // 32-bit Windows both flags are ignored.
 REGSAM ViewFlag(View view) { return view == View::Bits32 ? KEY_WOW64_32KEY : KEY_WOW64_64KEY; }
 
+bool Redirected(std::string_view classesKey) {
+  for (std::string_view top : {"CLSID", "Interface"}) {
+    if (classesKey.size() >= top.size() && EqualsNoCase(classesKey.substr(0, top.size()), top) &&
+        (classesKey.size() == top.size() || classesKey[top.size()] == '\\'))
+      return true;
+  }
+  return false;
+}
+
 class Key {
  public:
+  // HKEY_CLASSES_ROOT is read as what it merges, the user's classes over the
+  // machine's: opened directly, a 64-bit program's view flags are not
+  // honoured everywhere (Wine ignores them there).
   Key(View view, Hive hive, std::string_view path, REGSAM access) {
-    if (RegOpenKeyExW(Root(hive), Utf8ToWide(path).c_str(), 0, access | ViewFlag(view), &handle_) != ERROR_SUCCESS)
-      handle_ = nullptr;
+    const std::wstring wide = Utf8ToWide(path);
+    if (hive != Hive::ClassesRoot) {
+      Open(Root(hive), wide, access | ViewFlag(view));
+      return;
+    }
+    for (REGSAM flag : {ViewFlag(view), REGSAM(0)}) {
+      Open(HKEY_CURRENT_USER, L"Software\\Classes\\" + wide, access | flag);
+      if (!handle_) Open(HKEY_LOCAL_MACHINE, L"Software\\Classes\\" + wide, access | flag);
+      // Only class ids and interfaces are kept apart per view; ProgIDs and
+      // type libraries are one key for both, which Wine does not find
+      // through the other view's flag.
+      if (handle_ || Redirected(path)) break;
+    }
   }
   ~Key() {
     if (handle_) RegCloseKey(handle_);
@@ -41,6 +65,9 @@ class Key {
   HKEY get() const { return handle_; }
 
  private:
+  void Open(HKEY root, const std::wstring& path, REGSAM access) {
+    if (RegOpenKeyExW(root, path.c_str(), 0, access, &handle_) != ERROR_SUCCESS) handle_ = nullptr;
+  }
   HKEY handle_ = nullptr;
 };
 
