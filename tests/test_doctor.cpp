@@ -81,6 +81,18 @@ TEST(DoctorMask, NamesNumbersAllAndBadInput) {
   EXPECT_FALSE(ParseMaskValue("0x"));
 }
 
+// The scenario debug-mask-errors-only shows the add-in writing exactly the
+// lines of the mask the doctor computes for "ADDIN at ERROR"; it must hold
+// that very mask.
+TEST(DoctorMask, TheErrorsOnlyScenarioHoldsTheMaskTheDoctorComputes) {
+  std::ifstream in(std::string(KPX_SCENARIO_DIR) + "/debug-mask-errors-only.model.json");
+  const nlohmann::json model = nlohmann::json::parse(in);
+  const std::string held =
+      model["registry"]["HKEY_LOCAL_MACHINE\\SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VisualStudio"]["Debug"]["dword"];
+  std::string error;
+  EXPECT_EQ(ParseMaskValue(held), EncodeMask(*ParseLogIds("ADDIN", error), *ParseLevels("ERROR", error)));
+}
+
 // ------------------------------------------------------------- the log
 
 TEST(DoctorLog, ReadsBackWhatTheLoggerWritesWithAndWithoutStamps) {

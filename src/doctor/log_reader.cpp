@@ -26,6 +26,9 @@ std::optional<std::pair<int, size_t>> ReadName(std::string_view line, size_t at,
     auto [end, ec] = std::from_chars(begin, line.data() + line.size(), number);
     size_t length = static_cast<size_t>(end - begin);
     if (ec != std::errc() || line.substr(at + length, suffix.size()) != suffix) return std::nullopt;
+    // Only as the logger writes it: "9LEVEL", never "09LEVEL" or "3LEVEL"
+    // (level 3 is written INFO).
+    if (line.substr(at, length + suffix.size()) != name(number)) return std::nullopt;
     found = {{number, length + suffix.size()}};
   }
   const size_t length = found->second;
