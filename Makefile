@@ -36,6 +36,9 @@ test: setup native windows
 
 demo: native
 	$(NATIVE_DIR)/sim/kpx-sim examples/demo/model.json examples/demo/scenario.json --sandbox $(BUILD)/demo-sandbox
+	@echo
+	@echo "kpxdoctor on the demo's machine (the sandbox the run left):"
+	$(NATIVE_DIR)/kpxdoctor --sandbox $(BUILD)/demo-sandbox
 
 bench:
 	@scripts/setup.sh native

@@ -396,8 +396,9 @@ class ModelReader {
         if (fault.empty()) fault = plan.WriteFile(path);
         if (!fault.empty()) files->FailKey(path, fault);
         if (content.IsObject()) {
-          // {"text": ..., "readOnly": ..., "times": {...}}
-          content.ExpectKeys({"text", "readOnly", "times"});
+          // {"text": ... or "binary": "hex", "readOnly": ..., "times": {...}}
+          content.ExpectKeys({"text", "binary", "readOnly", "times"});
+          if (content.Find("text") && content.Find("binary")) content.Fail("a file has \"text\" or \"binary\", not both");
           FileDetailDef detail;
           detail.readOnly = content.BoolOr("readOnly", false);
           if (auto t = content.Find("times")) {
@@ -407,7 +408,8 @@ class ModelReader {
             if (auto a = t->Find("lastAccess")) detail.lastAccess = ParseFileTime(*a);
             if (auto w = t->Find("lastWrite")) detail.lastWrite = ParseFileTime(*w);
           }
-          m_.files.emplace_back(path, content.StringOr("text", ""));
+          auto binary = content.Find("binary");
+          m_.files.emplace_back(path, binary ? HexBytes(*binary) : content.StringOr("text", ""));
           m_.fileDetails[path] = detail;
         } else {
           m_.files.emplace_back(path, content.String());

@@ -13,7 +13,8 @@
 # x86 needs Debian's 32-bit Wine (wine32:i386); `scripts/setup.sh wine32`
 # installs it when missing. Where that fails the run says so, still runs
 # x64, and fails: x86 never counts as passed without having run.
-# KPX_WINTEST_ARCHS=x64 (or x86) runs one architecture on purpose.
+# KPX_WINTEST_ARCHS=x64 (or x86) runs one architecture on purpose;
+# KPX_WINTEST_DOCTOR_ONLY=1 runs only kpxdoctor's part.
 #
 # Usage: wintest/run.sh   (BUILD=<folder> to use another build folder)
 set -euo pipefail
@@ -70,7 +71,7 @@ for arch in "${archs[@]}"; do
   else
     cmake -S . -B "$dir" -DCMAKE_TOOLCHAIN_FILE="$toolchain" -DCMAKE_BUILD_TYPE=Release >/dev/null
   fi
-  targets=(kpx-wintest)
+  targets=(kpx-wintest kpxdoctor)
   grep -q '^kpx-comsim' <(cmake --build "$dir" --target help 2>/dev/null | sed 's/^\.\.\. //') && targets+=(kpx-comsim)
   if ! cmake --build "$dir" -j "$(nproc 2>/dev/null || echo 2)" --target "${targets[@]}" >"$BUILD/wintest-build-$arch.log" 2>&1; then
     tail -40 "$BUILD/wintest-build-$arch.log"
@@ -187,14 +188,25 @@ for arch in "${archs[@]}"; do
   echo "wintest: $arch: kpxaddin.dll through COM"
   if register "$arch" on; then
     ran[$arch]=1
-    test_host "$arch" || true
-    differential "$arch" || true
+    if [ -z "${KPX_WINTEST_DOCTOR_ONLY:-}" ]; then
+      test_host "$arch" || true
+      differential "$arch" || true
+    fi
     register "$arch" off
   else
     skipped_why[$arch]="regsvr32 failed"
   fi
   took[$arch]=$(( $(date +%s) - arch_started ))
 done
+# kpxdoctor needs both builds: it checks the 32-bit host's view and the
+# 64-bit one.
+source wintest/doctor.sh
+doctor_ran=""
+if [ -n "${ran[x86]:-}" ] && [ -n "${ran[x64]:-}" ]; then
+  doctor_phase
+  doctor_ran=1
+fi
+
 # Whatever a timed-out run left behind ends with the server.
 timeout 30 "$WINESERVER" -w || "$WINESERVER" -k || true
 
@@ -216,6 +228,13 @@ for arch in "${archs[@]}"; do
   sed -n 's/^ *benchmark: /wintest:     benchmark: /p' "$BUILD/wintest-$arch.log" 2>/dev/null || true
   if [ "${fails[$arch]}" -ne 0 ] || [ "${differ[$arch]}" -ne 0 ]; then failed=1; fi
 done
+if [ -n "$doctor_ran" ]; then
+  echo "wintest:   kpxdoctor (x86 and x64): $doctor_checks checks, $doctor_fails failed"
+  [ "$doctor_fails" -eq 0 ] || failed=1
+elif wants x86 && wants x64; then
+  echo "wintest:   kpxdoctor: NOT RUN: it needs both builds"
+  failed=1
+fi
 now=$(date +%s)
 echo "wintest: Wine part $((now - wine_started))s, whole run $((now - started))s"
 if [ "$failed" -eq 0 ]; then echo "wintest: passed"; else echo "wintest: FAILED"; fi
