@@ -9,6 +9,7 @@
 
 #include "automation/vb_strings.h"
 #include "dialogs/code_icons.h"
+#include "shared/shared_utilities.h"
 #include "sim/faults.h"
 
 namespace kpx::sim {
@@ -822,17 +823,6 @@ platform::DependencyOutcome SimUserInterface::ShowDependencyDialog(const platfor
 
 namespace {
 
-// The program a command line starts when no application name is given:
-// its first word, in double quotes or up to the first blank.
-std::string FirstWord(std::string_view line) {
-  while (!line.empty() && (line.front() == ' ' || line.front() == '\t')) line.remove_prefix(1);
-  if (!line.empty() && line.front() == '"') {
-    line.remove_prefix(1);
-    return std::string(line.substr(0, line.find('"')));
-  }
-  return std::string(line.substr(0, line.find_first_of(" \t")));
-}
-
 constexpr uint32_t kErrorFileNotFound = 2;
 constexpr uint32_t kErrorInvalidHandle = 6;
 
@@ -847,7 +837,7 @@ SimProcesses::Handle* SimProcesses::Find(int64_t handle) {
 
 bool SimProcesses::CreateProcess(std::string_view applicationName, std::string_view commandLine,
                                  platform::ProcessRecord& record) {
-  const std::string program = applicationName.empty() ? FirstWord(commandLine) : std::string(applicationName);
+  const std::string program = applicationName.empty() ? CommandLineProgram(commandLine) : std::string(applicationName);
   auto def = programs_.find(program);
   const uint32_t error = def == programs_.end()                            ? kErrorFileNotFound
                          : def->second.kind == ProcessDef::Kind::StartFails ? def->second.error

@@ -175,15 +175,6 @@ const char* const kCompanionClasses[] = {"{05D99488-AB9F-11D2-B9EB-006008BF3ACB}
                                          "{CFD996E3-1393-11D3-B9F3-006008BF3ACB}",
                                          "{B025E5DB-4064-11D3-B9F7-006008BF3ACB}"};
 
-std::string Escaped(std::string_view s) {
-  std::string out;
-  for (char c : s) {
-    if (c == '\\' || c == '"') out += '\\';
-    out += c;
-  }
-  return out;
-}
-
 // A sandbox with everything the add-in needs installed, as the package
 // installs it; each test breaks one thing.
 class DoctorChecks : public ::testing::Test {
@@ -246,18 +237,22 @@ class DoctorChecks : public ::testing::Test {
     }
     Remove(std::string("HKEY_CLASSES_ROOT\\TypeLib\\") + s.libid);
   }
+  // "@" is the key's default value, as REGEDIT4 writes it.
   void Value(const std::string& key, const std::string& name, const std::string& value) {
-    registry[key][name] = "\"" + Escaped(value) + "\"";
+    registry[key][name == "@" ? "" : name] = {platform::kRegSz, value + '\0'};
   }
   void Mask(uint32_t mask) {
-    char dword[16];
-    std::snprintf(dword, sizeof dword, "dword:%08x", mask);
-    registry["HKEY_LOCAL_MACHINE\\SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VisualStudio"]["Debug"] = dword;
+    std::string bytes(4, '\0');
+    for (int i = 0; i < 4; ++i) bytes[i] = static_cast<char>(mask >> (8 * i));
+    registry["HKEY_LOCAL_MACHINE\\SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VisualStudio"]["Debug"] = {
+        platform::kRegDword, bytes};
   }
   // The key and every key below it.
   void Remove(const std::string& key) {
     for (auto it = registry.begin(); it != registry.end();)
-      it = it->first == key || it->first.rfind(key + "\\", 0) == 0 ? registry.erase(it) : std::next(it);
+      it = EqualsNoCase(it->first, key) || EqualsNoCase(it->first.substr(0, key.size() + 1), key + "\\")
+               ? registry.erase(it)
+               : std::next(it);
   }
   fs::path Host(std::string_view windows) {
     std::string rel(windows.substr(3));
@@ -270,14 +265,7 @@ class DoctorChecks : public ::testing::Test {
   }
 
   std::vector<Finding> Run(Options options = {}) {
-    std::ofstream out(dir / "registry.reg", std::ios::binary);
-    out << "REGEDIT4\r\n";
-    for (const auto& [key, values] : registry) {
-      out << "\r\n[" << key << "]\r\n";
-      for (const auto& [name, value] : values)
-        out << (name == "@" ? "@" : "\"" + name + "\"") << "=" << value << "\r\n";
-    }
-    out.close();
+    std::ofstream(dir / "registry.reg", std::ios::binary) << kpx::posix::WriteRegedit(registry);
     kpx::posix::SandboxMachine machine(dir);
     return RunChecks(machine, options);
   }
@@ -304,7 +292,7 @@ class DoctorChecks : public ::testing::Test {
   }
 
   fs::path dir;
-  std::map<std::string, std::map<std::string, std::string>> registry;
+  kpx::posix::RegeditData registry;
 };
 
 TEST_F(DoctorChecks, AnIntactInstallationIsAllOkAndTheSandboxSkipsOnlyCreation) {

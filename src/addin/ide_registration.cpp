@@ -3,6 +3,8 @@
 // when the user turned it off there.
 #include <string>
 
+#include "addin/ide_registration.h"
+
 #include "addin/api.h"
 #include "automation/error_styles.h"
 #include "automation/vb_strings.h"
@@ -13,28 +15,22 @@ namespace kpx {
 
 namespace {
 
-constexpr std::string_view kVisualCppSetupKey = "SOFTWARE\\Microsoft\\VisualStudio\\6.0\\Setup\\Microsoft Visual C++";
-constexpr std::string_view kIdeAddInKey = "Software\\Microsoft\\DevStudio\\6.0\\AddIns\\kpxIDEAddin.DSAddIn";
-constexpr std::string_view kIdeAddInFile = "\\vc\\dlls\\kpxideaddin.dll";
 constexpr int32_t kMsgNoVisualCpp = 5031;
 constexpr int32_t kMsgCannotRegister = 1218;
 constexpr int32_t kMsgNoIdeAddInFile = 1219;
 
-// The folder the host is installed in, when the host cannot say.
-constexpr std::string_view kDefaultLocation = "C:\\Program Files\\Tolvek Software\\Quarn";
-
 }  // namespace
 
-// The language add-in's files lie beneath the host's own installation
-// folder, so the location is that folder, without blanks around it or
-// trailing "\" (callers append "\..."). An empty path gives the default
-// installation folder when `useDefault` is set, else "".
-std::string API::GetLocation(const std::string& path, bool useDefault) {
-  module_.DebugLog("kpxAddin.GetLocation(Path, UseDefault)", logid::ADDIN, loglevel::TRACE);
+std::string AddInLocation(std::string_view path, bool useDefault) {
   std::string location = Trim(path);
   while (!location.empty() && location.back() == '\\') location.pop_back();
   if (location.empty() && useDefault) location = kDefaultLocation;
   return location;
+}
+
+std::string API::GetLocation(const std::string& path, bool useDefault) {
+  module_.DebugLog("kpxAddin.GetLocation(Path, UseDefault)", logid::ADDIN, loglevel::TRACE);
+  return AddInLocation(path, useDefault);
 }
 
 bool API::RegisterIDEAddIn(const ObjectPtr& QuarnApp) {

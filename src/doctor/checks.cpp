@@ -6,7 +6,10 @@
 #include "automation/variant.h"
 #include "automation/vb_strings.h"
 #include "doctor/debug_mask.h"
+#include "addin/ide_registration.h"
 #include "model/stereotype_config.h"
+#include "restore/difference_tool.h"
+#include "shared/shared_utilities.h"
 #include "shared/resource_texts.h"
 #include "shared/shared_debug_logger.h"
 
@@ -157,13 +160,11 @@ std::string RegisterFix(View view) {
          "then regsvr32 kpxaddin.dll";
 }
 
-Finding RegistrationFinding(Machine& m, View view, const Server& server) {
-  Finding f;
-  f.id = std::string(server.idPrefix) + "-registered-" + std::to_string(Bits(view));
-  f.title = std::string(server.file) + " registered for " + BitsText(view) + " programs";
-  f.guards = view == View::Bits32 ? "creating the add-in in the 32-bit Quarn host"
-                                  : "creating the add-in in 64-bit hosts (Quarn itself is 32-bit)";
-  Registration r = ReadRegistration(m, view, server);
+Finding RegistrationFinding(View view, const Server& server, const Registration& r) {
+  Finding f = NewFinding(std::string(server.idPrefix) + "-registered-" + std::to_string(Bits(view)),
+                         std::string(server.file) + " registered for " + BitsText(view) + " programs",
+                         view == View::Bits32 ? "creating the add-in in the 32-bit Quarn host"
+                                              : "creating the add-in in 64-bit hosts (Quarn itself is 32-bit)");
   if (!r.present && view == View::Bits64) {
     f.verdict = Verdict::Ok;
     f.detail = "not registered for 64-bit programs; the 32-bit Quarn host does not need it";
@@ -183,14 +184,14 @@ Finding RegistrationFinding(Machine& m, View view, const Server& server) {
   return f;
 }
 
-Finding CreationFinding(Machine& m, const Server& server) {
-  const View own = m.ProcessBits() == 64 ? View::Bits64 : View::Bits32;
+// `registered`: whether the server has classes in `own`, the view of this
+// program's bitness.
+Finding CreationFinding(Machine& m, View own, const Server& server, bool registered) {
   const ClassIdentity& first = server.classes.front();
-  Finding f;
-  f.id = std::string(server.idPrefix) + "-creatable";
-  f.title = std::string(first.progId) + " created in a " + BitsText(own) + " program";
-  f.guards = server.idPrefix == std::string("addin") ? "Quarn starting the add-in" : "every text the add-in shows";
-  if (!ReadRegistration(m, own, server).present) {
+  Finding f = NewFinding(std::string(server.idPrefix) + "-creatable",
+                         std::string(first.progId) + " created in a " + BitsText(own) + " program",
+                         server.idPrefix == std::string("addin") ? "Quarn starting the add-in" : "every text the add-in shows");
+  if (!registered) {
     f.verdict = Verdict::Skip;
     f.detail = "not registered for " + BitsText(own) + " programs";
     return f;
@@ -214,10 +215,6 @@ Finding CreationFinding(Machine& m, const Server& server) {
 
 // --------------------------------------------------------- the host's side
 
-constexpr const char* kVisualCppKey = "SOFTWARE\\Microsoft\\VisualStudio\\6.0\\Setup\\Microsoft Visual C++";
-constexpr const char* kVisualStudioSetupKey = "SOFTWARE\\Microsoft\\VisualStudio\\6.0\\Setup\\Microsoft Visual Studio";
-constexpr const char* kIdeAddInKey = "Software\\Microsoft\\DevStudio\\6.0\\AddIns\\kpxIDEAddin.DSAddIn";
-constexpr const char* kAddInsKey = "SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\";
 
 // What the add-in writes to Quarn's log at every start while this is so.
 std::string HostLogSays(int32_t id) {
@@ -231,42 +228,37 @@ std::string Value(Machine& m, Hive hive, const std::string& key, const char* nam
 
 Finding VisualCppFinding(Machine& m) {
   Finding f = NewFinding("visual-cpp", "Visual C++ 6 installed", "the add-in staying active (round-trip engineering needs it)");
-  const std::string dir = Value(m, Hive::LocalMachine, kVisualCppKey, "ProductDir");
+  const std::string dir = Value(m, Hive::LocalMachine, std::string(kVisualCppSetupKey), "ProductDir");
   if (!dir.empty()) {
     f.detail = "ProductDir " + dir;
     return f;
   }
   f.verdict = Verdict::Fail;
-  f.detail = std::string("HKEY_LOCAL_MACHINE\\") + kVisualCppKey + " has no \"ProductDir\"";
+  f.detail = "HKEY_LOCAL_MACHINE\\" + std::string(kVisualCppSetupKey) + " has no \"ProductDir\"";
   f.meaning = HostLogSays(5031);
   f.fix = "install Visual C++ 6 (Visual Studio 6.0); if it is installed, repair it so that its setup writes ProductDir";
   return f;
-}
-
-std::string HostFolder(const std::string& path) {
-  std::string folder = Trim(path);
-  while (!folder.empty() && folder.back() == '\\') folder.pop_back();
-  return folder;
 }
 
 Finding IdeAddInFinding(Machine& m, const Options& options) {
   Finding f = NewFinding("ide-addin", "Developer Studio add-in kpxideaddin.dll", "the add-in staying active (round-trip engineering)");
   std::string file;
   std::string from;
-  const std::string registered = m.ReadString(View::Bits32, Hive::CurrentUser, kIdeAddInKey, "Filename").value_or("");
+  const std::string key(kIdeAddInKey);
+  const std::string registered = m.ReadString(View::Bits32, Hive::CurrentUser, key, "Filename").value_or("");
   if (!options.hostFolder.empty()) {
-    file = HostFolder(options.hostFolder) + "\\vc\\dlls\\kpxideaddin.dll";
+    file = AddInLocation(options.hostFolder, false) + std::string(kIdeAddInFile);
     from = "under the Quarn folder given";
   } else if (!registered.empty()) {
     file = registered;
     from = "as Developer Studio's add-in key names it";
   } else {
-    file = std::string(kDefaultHostFolder) + "\\vc\\dlls\\kpxideaddin.dll";
+    file = AddInLocation("", true) + std::string(kIdeAddInFile);
     from = "under Quarn's default folder (give --host-dir for another)";
   }
   if (m.Kind(file) == PathKind::File) {
     f.detail = file;
-    const std::optional<std::string> on = m.ReadString(View::Bits32, Hive::CurrentUser, kIdeAddInKey, "");
+    const std::optional<std::string> on = m.ReadString(View::Bits32, Hive::CurrentUser, key, "");
     if (on && *on != "1") f.detail += "; switched off in Developer Studio, switched on again when Quarn starts the add-in";
     return f;
   }
@@ -279,7 +271,8 @@ Finding IdeAddInFinding(Machine& m, const Options& options) {
 
 Finding VisualStudioFinding(Machine& m) {
   Finding f = NewFinding("visualstudio-addin", "Quarn's \"VisualStudio\" add-in", "Generate Code and Update Model (forwarded to it)");
-  const std::string key = std::string(kAddInsKey) + "VisualStudio";
+  // The sibling's key is where the debug settings live too.
+  const std::string key(kDebugSettingsKey);
   const bool installed = m.KeyExists(View::Bits32, Hive::LocalMachine, key);
   const std::optional<std::string> active = m.ReadString(View::Bits32, Hive::CurrentUser, key, "Active");
   if (!installed) {
@@ -326,18 +319,9 @@ const Companion kCompanions[] = {
     {"{B025E5DB-4064-11D3-B9F7-006008BF3ACB}", "Import Type Library"},
 };
 
-// The program a LocalServer32 command line starts.
-std::string ServerProgram(const std::string& command) {
-  std::string c = Trim(command);
-  if (!c.empty() && c.front() == '"') {
-    size_t end = c.find('"', 1);
-    return c.substr(1, end == std::string::npos ? std::string::npos : end - 1);
-  }
-  return c.substr(0, c.find(' '));
-}
-
 // Why a class cannot be created in the host's view; "" when it can.
 std::string ClassProblem(Machine& m, const std::string& progIdOrClass) {
+  if (progIdOrClass.empty()) return "no ProgID given";
   std::string clsid = progIdOrClass;
   if (progIdOrClass.front() != '{') {
     std::optional<std::string> found = m.ReadString(View::Bits32, Hive::ClassesRoot, progIdOrClass + "\\CLSID", "");
@@ -347,7 +331,7 @@ std::string ClassProblem(Machine& m, const std::string& progIdOrClass) {
   const std::string key = "CLSID\\" + clsid;
   if (!m.KeyExists(View::Bits32, Hive::ClassesRoot, key)) return "class " + clsid + " is not registered for 32-bit programs";
   std::string file = m.ReadString(View::Bits32, Hive::ClassesRoot, key + "\\InprocServer32", "").value_or("");
-  if (file.empty()) file = ServerProgram(m.ReadString(View::Bits32, Hive::ClassesRoot, key + "\\LocalServer32", "").value_or(""));
+  if (file.empty()) file = CommandLineProgram(m.ReadString(View::Bits32, Hive::ClassesRoot, key + "\\LocalServer32", "").value_or(""));
   if (file.empty()) return "class " + clsid + " names no server file";
   if (m.Kind(file) != PathKind::File) return "its server " + file + " does not exist";
   return {};
@@ -395,39 +379,35 @@ Finding StereotypeFinding(Machine& m) {
   return f;
 }
 
+constexpr const char* kCannotCompare = "comparing a file with its backup in the Restore dialog does nothing";
+
 Finding DifferenceToolFinding(Machine& m) {
   Finding f = NewFinding("difference-tool", "difference tool", "comparing a file with its backup in the Restore dialog");
-  std::string command = Trim(Value(m, Hive::CurrentUser, kVcAddInEventsKey, "OnDifference"));
-  if (size_t bar = command.find('|'); bar != std::string::npos) command = Trim(command.substr(0, bar));
-  if (command.empty() || EqualsNoCase(command, "windiff")) {
-    const std::string dir = Value(m, Hive::LocalMachine, kVisualStudioSetupKey, "ProductDir");
-    const std::string windiff = dir + "\\Common\\Tools\\windiff.exe";
-    if (!dir.empty() && m.Kind(windiff) == PathKind::File) {
-      f.detail = "windiff: " + windiff;
-      return f;
-    }
+  const std::string command = ParseDifferenceSetting(Value(m, Hive::CurrentUser, kVcAddInEventsKey, "OnDifference")).command;
+  if (EqualsNoCase(command, "windiff")) {
+    const std::string key(DifferenceTool::kWindiffKey);
+    const std::string dir = Value(m, Hive::LocalMachine, key, "ProductDir");
+    const std::string windiff = dir.empty() ? "" : ParseShellCommand(WindiffCommand(dir), "", "").program;
+    f.detail = "windiff: " + windiff;
+    if (!dir.empty() && m.Kind(windiff) == PathKind::File) return f;
     f.verdict = Verdict::Warn;
-    f.detail = dir.empty() ? std::string("windiff, but HKEY_LOCAL_MACHINE\\") + kVisualStudioSetupKey + " has no \"ProductDir\""
+    f.meaning = kCannotCompare;
+    f.detail = dir.empty() ? "windiff, but HKEY_LOCAL_MACHINE\\" + key + " has no \"ProductDir\""
                            : "windiff, but " + windiff + " does not exist";
-    f.meaning = "comparing a file with its backup in the Restore dialog does nothing";
     f.fix = "install Visual Studio 6's tools, or set another tool in the VC++ add-in's setting Events/OnDifference";
     return f;
   }
-  const std::string verb = command.substr(0, command.find(' '));
-  if (EqualsNoCase(verb, "shell")) {
-    std::string rest = Trim(command.substr(verb.size()));
-    std::string program = ServerProgram(rest);
+  if (IsShellCommand(command)) {
+    const std::string program = ParseShellCommand(command, "", "").program;
     if (program.find('\\') == std::string::npos) {
       f.detail = "shell: " + program + ", looked for on the search path when it runs";
       return f;
     }
-    if (m.Kind(program) == PathKind::File) {
-      f.detail = "shell: " + program;
-      return f;
-    }
+    f.detail = "shell: " + program;
+    if (m.Kind(program) == PathKind::File) return f;
     f.verdict = Verdict::Warn;
-    f.detail = "shell: " + program + " does not exist";
-    f.meaning = "comparing a file with its backup in the Restore dialog does nothing";
+    f.meaning = kCannotCompare;
+    f.detail += " does not exist";
     f.fix = "install " + program + " or correct the VC++ add-in's setting Events/OnDifference";
     return f;
   }
@@ -439,7 +419,7 @@ Finding DifferenceToolFinding(Machine& m) {
   }
   f.verdict = Verdict::Warn;
   f.detail = "component " + command + ": " + problem;
-  f.meaning = "comparing a file with its backup in the Restore dialog does nothing";
+  f.meaning = kCannotCompare;
   f.fix = "install " + command + " or correct the VC++ add-in's setting Events/OnDifference";
   return f;
 }
@@ -515,12 +495,22 @@ const char* VerdictName(Verdict v) {
 std::vector<Finding> RunChecks(Machine& machine, const Options& options) {
   std::vector<Finding> out;
   const std::vector<View> views = machine.Views();
+  // Each server's registration is read once per view; creation asks only
+  // whether the own view has it.
+  const View own = machine.ProcessBits() == 64 ? View::Bits64 : View::Bits32;
+  bool resourceHere = false, addinHere = false;
   for (View view : views) {
-    out.push_back(RegistrationFinding(machine, view, kResource));
-    out.push_back(RegistrationFinding(machine, view, kAddIn));
+    const Registration resource = ReadRegistration(machine, view, kResource);
+    const Registration addin = ReadRegistration(machine, view, kAddIn);
+    out.push_back(RegistrationFinding(view, kResource, resource));
+    out.push_back(RegistrationFinding(view, kAddIn, addin));
+    if (view == own) {
+      resourceHere = resource.present;
+      addinHere = addin.present;
+    }
   }
-  out.push_back(CreationFinding(machine, kResource));
-  out.push_back(CreationFinding(machine, kAddIn));
+  out.push_back(CreationFinding(machine, own, kResource, resourceHere));
+  out.push_back(CreationFinding(machine, own, kAddIn, addinHere));
   out.push_back(VisualCppFinding(machine));
   out.push_back(IdeAddInFinding(machine, options));
   out.push_back(VisualStudioFinding(machine));

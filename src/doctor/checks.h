@@ -48,6 +48,5 @@ DebugSettings ReadDebugSettings(Machine& machine);
 // Registry places the checks read that the add-in's own code does not name.
 inline constexpr const char* kVcAddInKey = "SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VC++";
 inline constexpr const char* kVcAddInEventsKey = "SOFTWARE\\Tolvek Software\\Quarn\\AddIns\\VC++\\Events";
-inline constexpr const char* kDefaultHostFolder = "C:\\Program Files\\Tolvek Software\\Quarn";
 
 }  // namespace kpx::doctor

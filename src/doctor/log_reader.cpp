@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <charconv>
 
+#include "model/stereotype_config.h"
 #include "shared/shared_debug_logger.h"
 
 namespace kpx::doctor {
@@ -67,13 +68,7 @@ std::optional<LogLine> ParseLogLine(std::string_view line) {
 std::vector<std::string> FilterLog(std::string_view text, const LogFilter& filter) {
   std::vector<std::string> out;
   const bool everything = filter.levels.empty() && filter.ids.empty();
-  size_t start = 0;
-  while (start < text.size()) {
-    size_t end = text.find('\n', start);
-    if (end == std::string_view::npos) end = text.size();
-    std::string_view line = text.substr(start, end - start);
-    start = end + 1;
-    if (!line.empty() && line.back() == '\r') line.remove_suffix(1);
+  for (std::string_view line : TextLines(text)) {
     if (everything) {
       out.emplace_back(line);
       continue;

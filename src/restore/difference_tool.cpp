@@ -72,6 +72,18 @@ std::string FillPlaceholders(std::string_view arguments, std::string_view backup
 
 }  // namespace
 
+std::string WindiffCommand(std::string_view productDir) {
+  return "Shell \"" + std::string(productDir) + "\\Common\\Tools\\windiff.exe\" windiff \"%1\" \"%2\"";
+}
+
+bool IsShellCommand(std::string_view command) {
+  const std::string work = std::string(command) + " ";
+  const std::string verb = work.substr(0, work.find(' '));
+  // "shellexecute " keeps its blank, so no verb ever equals it and a
+  // command beginning with that word is taken as a ProgID.
+  return EqualsNoCase(verb, "shell") || EqualsNoCase(verb, "shellexecute ");
+}
+
 ShellCommand ParseShellCommand(std::string_view command, std::string_view backup, std::string_view source) {
   const std::string work = std::string(command) + " ";
   const size_t verbEnd = work.find(' ');
@@ -105,14 +117,9 @@ bool DifferenceTool::RunDifference(std::string_view restoreItem) {
           const std::string productDir =
               RegistryQueryValue(module_.platform().registry, RootKey::LocalMachine, kWindiffKey, "ProductDir")
                   .toString();
-          if (!productDir.empty())
-            command_ = "Shell \"" + productDir + "\\Common\\Tools\\windiff.exe\" windiff \"%1\" \"%2\"";
+          if (!productDir.empty()) command_ = WindiffCommand(productDir);
         }
-        const std::string work = command_ + " ";
-        const std::string verb = work.substr(0, work.find(' '));
-        // "shellexecute " keeps its blank, so no verb ever equals it and a
-        // command beginning with that word is taken as a ProgID.
-        if (!EqualsNoCase(verb, "shell") && !EqualsNoCase(verb, "shellexecute ")) {
+        if (!IsShellCommand(command_)) {
           ObjectPtr tool = module_.platform().objects.CreateObject(command_);
           CallByName(tool, "OnDifference", CallKind::Method, {Variant(backup), Variant(source)});
           return module_.error().number == 0;

@@ -28,6 +28,13 @@ struct DifferenceSetting {
 };
 DifferenceSetting ParseDifferenceSetting(std::string_view setting);
 
+// The command that starts windiff of the Visual Studio installed in
+// `productDir` (the word windiff after the path becomes the child's first
+// command-line token, as the command line does not repeat the program).
+std::string WindiffCommand(std::string_view productDir);
+// Whether a command starts a program ("shell ..."); any other is a ProgID.
+bool IsShellCommand(std::string_view command);
+
 // A "shell" command taken apart: the program, and the arguments with "%1"
 // filled with the backup and "%2" with the source.
 struct ShellCommand {

@@ -66,4 +66,13 @@ bool WaitForChild(Module& module, std::string_view applicationName, const platfo
   return ResultFromError(module, number, std::move(description));
 }
 
+std::string CommandLineProgram(std::string_view line) {
+  while (!line.empty() && (line.front() == ' ' || line.front() == '\t')) line.remove_prefix(1);
+  if (!line.empty() && line.front() == '"') {
+    line.remove_prefix(1);
+    return std::string(line.substr(0, line.find('"')));
+  }
+  return std::string(line.substr(0, line.find_first_of(" \t")));
+}
+
 }  // namespace kpx

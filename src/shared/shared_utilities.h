@@ -22,6 +22,11 @@ bool SetErrorFromSystem(Module& module, int32_t defaultNumber, std::string defau
 // was (and it stays).
 bool ResultFromError(Module& module, int32_t number, std::string description);
 
+// The program a command line starts when no application name is given, as
+// Windows reads it: its first word, in double quotes or up to the first
+// blank or tab.
+std::string CommandLineProgram(std::string_view commandLine);
+
 // Starts `commandLine` with `applicationName` and waits up to `timeout`
 // milliseconds for it to end. True when it ran and exited with code 0.
 bool RunChildProcess(Module& module, std::string_view applicationName, std::string_view commandLine,

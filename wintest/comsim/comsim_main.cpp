@@ -71,6 +71,7 @@
 #include "platform/win32/win32_platform.h"
 #include "platform/win32/win32_strings.h"
 #include "shared/shared_debug_logger.h"
+#include "shared/shared_utilities.h"
 #include "sim/companions.h"
 #include "sim/event_log.h"
 #include "sim/json_source.h"
@@ -301,13 +302,7 @@ std::string AsBothSeeIt(const std::string& line) {
 std::string StartOf(const EventJson& process) {
   std::string program = process.value("application", "");
   const std::string line = process.at("commandLine");
-  if (program.empty()) {
-    const size_t start = line.find_first_not_of(" \t");
-    if (start != std::string::npos && line[start] == '"')
-      program = line.substr(start + 1, line.find('"', start + 1) - start - 1);
-    else if (start != std::string::npos)
-      program = line.substr(start, line.find_first_of(" \t", start) - start);
-  }
+  if (program.empty()) program = kpx::CommandLineProgram(line);
   return Lower(program) + "\t" + line;
 }
 
